@@ -1,0 +1,365 @@
+// Calls through the driver, in both directions, with the kernel played by the test.
+#include <android-base/unique_fd.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <chrono>
+#include <functional>
+#include <thread>
+
+#include "binder/Binder.h"
+#include "binder/IServiceManager.h"
+#include "platform/linux/binder/remote_fixture.h"
+
+namespace android {
+namespace {
+
+using testing::ElementsAre;
+using testing::SizeIs;
+
+// Runs a function for each call.
+class Handler : public BBinder {
+ public:
+  using Function = std::function<status_t(const Parcel&, Parcel*)>;
+  explicit Handler(Function function) : function_(std::move(function)) {}
+
+ protected:
+  status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
+    if (code != 11)
+      return BBinder::onTransact(code, data, reply, flags);
+    return function_(data, reply);
+  }
+
+ private:
+  const Function function_;
+};
+
+void aim_at(binder_transaction_data* transaction, const sp<IBinder>& object) {
+  transaction->target.ptr = reinterpret_cast<uintptr_t>(object->getWeakRefs());
+  transaction->cookie = reinterpret_cast<uintptr_t>(object.get());
+  transaction->code = 11;
+}
+
+TEST_F(RemoteTest, SendsTheRequestAndTakesTheReply) {
+  kernel_.add_reply(words({41, 42}));
+  Parcel reply;
+  ASSERT_EQ(OK, call(&reply));
+  EXPECT_EQ(41, reply.readInt32());
+  EXPECT_EQ(42, reply.readInt32());
+  const auto sent = kernel_.written(BC_TRANSACTION);
+  ASSERT_THAT(sent, SizeIs(1));
+  const auto transaction = sent[0].as<binder_transaction_data>();
+  EXPECT_EQ(3U, transaction.target.handle);
+  EXPECT_EQ(11U, transaction.code);
+  EXPECT_EQ(uint32_t{TF_ACCEPT_FDS}, transaction.flags);
+  EXPECT_EQ(words({7}), sent[0].data);
+  EXPECT_EQ(INVALID_OPERATION, reply.writeInt32(1)) << "received parcels are read-only";
+  EXPECT_THAT(kernel_.written(BC_FREE_BUFFER), SizeIs(0));
+  const auto address = reinterpret_cast<uintptr_t>(reply.data());
+  reply.freeData();
+  const auto freed = kernel_.written(BC_FREE_BUFFER);
+  ASSERT_THAT(freed, SizeIs(1)) << "at once: this thread may not talk to the driver again";
+  EXPECT_EQ(address, freed[0].as<uint64_t>());
+  EXPECT_EQ(OK, reply.writeInt32(1));
+}
+
+TEST_F(RemoteTest, TurnsTheDriversAnswersIntoStatuses) {
+  const std::string complete = FakeDriver::returned(BR_TRANSACTION_COMPLETE);
+  const auto status_reply = [this](int32_t status) {
+    binder_transaction_data answer = kernel_.deliver(words({status}));
+    answer.flags = TF_STATUS_CODE;
+    return FakeDriver::returned(BR_REPLY, answer);
+  };
+  const struct {
+    std::string returned;
+    status_t status;
+  } cases[] = {
+      {FakeDriver::returned(BR_DEAD_REPLY), DEAD_OBJECT},
+      {FakeDriver::returned(BR_FAILED_REPLY), FAILED_TRANSACTION},
+      {complete + FakeDriver::returned(BR_FROZEN_REPLY), FAILED_TRANSACTION},
+      {FakeDriver::returned(BR_ERROR, int32_t{-ENOMEM}), NO_MEMORY},
+      {complete + status_reply(PERMISSION_DENIED), PERMISSION_DENIED},
+      {complete + status_reply(UNKNOWN_TRANSACTION), UNKNOWN_TRANSACTION},
+  };
+  for (const auto& item : cases) {
+    kernel_.add_step(item.returned);
+    Parcel reply;
+    reply.writeInt32(1);
+    EXPECT_EQ(item.status, call(&reply));
+    EXPECT_EQ(0U, reply.dataSize()) << "nothing of an older reply";
+  }
+  EXPECT_THAT(kernel_.written(BC_FREE_BUFFER), SizeIs(2)) << "status replies are freed as well";
+}
+
+TEST_F(RemoteTest, FailsWithTheDriverAndRetriesInterruptions) {
+  kernel_.add_error(-ENOMEM);
+  EXPECT_EQ(NO_MEMORY, call(nullptr));
+  kernel_.add_error(-EINTR);
+  kernel_.add_error(-EINTR);
+  kernel_.add_reply(words({1}));
+  EXPECT_EQ(OK, call(nullptr));
+  EXPECT_THAT(kernel_.written(BC_TRANSACTION), SizeIs(2)) << "an interrupted call is sent once";
+}
+
+TEST_F(RemoteTest, DoesNotWaitForAOneWayCall) {
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+  EXPECT_EQ(OK, call(nullptr, TF_ONE_WAY));
+  EXPECT_NE(0U,
+            kernel_.written(BC_TRANSACTION)[0].as<binder_transaction_data>().flags & TF_ONE_WAY);
+}
+
+TEST_F(RemoteTest, SendsNoDamagedParcel) {
+  Parcel data;
+  data.writeFileDescriptor(-1);
+  EXPECT_EQ(BAD_VALUE, IPCThreadState::self()->transact(3, 11, data, nullptr, 0));
+  EXPECT_THAT(kernel_.codes(), SizeIs(0));
+}
+
+TEST_F(RemoteTest, HasSensitiveBuffersWiped) {
+  Parcel data;
+  data.markSensitive();
+  kernel_.add_reply(words({1}), {}, TF_CLEAR_BUF);
+  Parcel reply;
+  ASSERT_EQ(OK, IPCThreadState::self()->transact(3, 11, data, &reply, 0));
+  const auto sent = kernel_.written(BC_TRANSACTION)[0].as<binder_transaction_data>();
+  EXPECT_NE(0U, sent.flags & TF_CLEAR_BUF);
+  EXPECT_TRUE(reply.isSensitive());
+}
+
+TEST_F(RemoteTest, ServesCallsWhileItWaits) {
+  const sp<IBinder> object = new Handler([](const Parcel& data, Parcel* reply) {
+    EXPECT_EQ(4321, IPCThreadState::self()->getCallingPid());
+    EXPECT_EQ(1000U, IPCThreadState::self()->getCallingUid());
+    return reply->writeInt32(data.readInt32() + 1);
+  });
+  binder_transaction_data incoming = kernel_.deliver(words({30}));
+  aim_at(&incoming, object);
+  incoming.sender_pid = 4321;
+  incoming.sender_euid = 1000;
+  incoming.flags = TF_CLEAR_BUF;
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE) +
+                   FakeDriver::returned(BR_TRANSACTION, incoming));
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+  kernel_.add_step(FakeDriver::returned(BR_REPLY, kernel_.deliver(words({5}))));
+  Parcel reply;
+  ASSERT_EQ(OK, call(&reply));
+  EXPECT_EQ(5, reply.readInt32());
+  EXPECT_THAT(kernel_.codes(), ElementsAre(BC_TRANSACTION, BC_FREE_BUFFER, BC_REPLY))
+      << "the request goes back before its reply leaves";
+  const auto answer = kernel_.written(BC_REPLY)[0];
+  EXPECT_EQ(words({31}), answer.data);
+  EXPECT_EQ(uint32_t{TF_CLEAR_BUF}, answer.as<binder_transaction_data>().flags);
+  EXPECT_EQ(getpid(), IPCThreadState::self()->getCallingPid());
+  EXPECT_EQ(getuid(), IPCThreadState::self()->getCallingUid());
+}
+
+TEST_F(RemoteTest, AnswersFailuresWithAStatus) {
+  const sp<IBinder> object = new Handler([](const Parcel& data, Parcel* reply) {
+    reply->writeInt32(99);
+    return data.readInt32();
+  });
+  const auto add_incoming = [&](const std::string& data, uint32_t code, uint32_t flags) {
+    binder_transaction_data incoming = kernel_.deliver(data);
+    aim_at(&incoming, object);
+    incoming.code = code;
+    incoming.flags = flags;
+    kernel_.add_step(FakeDriver::returned(BR_TRANSACTION, incoming));
+    if ((flags & TF_ONE_WAY) == 0)
+      kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+  };
+  add_incoming(words({PERMISSION_DENIED}), 11, 0);
+  add_incoming(words({}), 77, 0);
+  add_incoming(words({PERMISSION_DENIED}), 11, TF_ONE_WAY);
+  serve_script();
+  const auto answers = kernel_.written(BC_REPLY);
+  ASSERT_THAT(answers, SizeIs(2)) << "none to a one-way call";
+  EXPECT_EQ(words({PERMISSION_DENIED}), answers[0].data) << "and nothing of the reply";
+  EXPECT_EQ(uint32_t{TF_STATUS_CODE}, answers[0].as<binder_transaction_data>().flags);
+  EXPECT_EQ(words({UNKNOWN_TRANSACTION}), answers[1].data);
+  EXPECT_THAT(kernel_.written(BC_FREE_BUFFER), SizeIs(3));
+}
+
+TEST_F(RemoteTest, AnswersCallsToTheContextManager) {
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION, kernel_.deliver(words({}))));
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+  serve_script();
+  EXPECT_EQ(words({UNKNOWN_TRANSACTION}), kernel_.written(BC_REPLY)[0].data) << "there is none yet";
+
+  kernel_.restart();
+  IPCThreadState::self()->setTheContextObject(
+      new Handler([](const Parcel&, Parcel* reply) { return reply->writeInt32(8); }));
+  binder_transaction_data incoming = kernel_.deliver(words({}));
+  incoming.code = 11;
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION, incoming));
+  kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+  serve_script();
+  EXPECT_EQ(words({8}), kernel_.written(BC_REPLY)[0].data);
+  IPCThreadState::self()->setTheContextObject(nullptr);
+}
+
+TEST_F(RemoteTest, ReceivesDescriptorsAndClosesThem) {
+  const int received = open("/dev/null", O_RDONLY | O_CLOEXEC);
+  const int unread = open("/dev/null", O_RDONLY | O_CLOEXEC);
+  kernel_.add_reply(object_bytes(BINDER_TYPE_FD, static_cast<uint32_t>(received)) +
+                        object_bytes(BINDER_TYPE_FD, static_cast<uint32_t>(unread)),
+                    {0, 24});
+  Parcel reply;
+  ASSERT_EQ(OK, call(&reply));
+  EXPECT_TRUE(reply.hasFileDescriptors());
+  EXPECT_EQ(nullptr, reply.readStrongBinder()) << "not of this kind";
+  EXPECT_EQ(received, reply.readFileDescriptor());
+  Parcel copy;
+  ASSERT_EQ(OK, copy.appendFrom(&reply, 0, reply.dataSize()));
+  reply.freeData();
+  EXPECT_LT(fcntl(received, F_GETFD), 0);
+  EXPECT_LT(fcntl(unread, F_GETFD), 0);
+  copy.setDataPosition(0);
+  EXPECT_GE(fcntl(copy.readFileDescriptor(), F_GETFD), 0) << "a copy has its own";
+}
+
+TEST_F(RemoteTest, AsksForTheInterfaceNameOnce) {
+  const sp<IBinder> object = proxy(5);
+  kernel_.add_step(FakeDriver::returned(BR_FAILED_REPLY));
+  EXPECT_EQ(0U, object->getInterfaceDescriptor().size()) << "asked again next time";
+  Parcel name;
+  name.writeString16(String16("sentrova.test"));
+  kernel_.add_reply({reinterpret_cast<const char*>(name.data()), name.dataSize()});
+  EXPECT_EQ(String16("sentrova.test"), object->getInterfaceDescriptor());
+  EXPECT_EQ(String16("sentrova.test"), object->getInterfaceDescriptor());
+}
+
+TEST_F(RemoteTest, StartsAThreadWhenTheDriverAsks) {
+  ProcessState::self()->startThreadPool();
+  kernel_.add_step(FakeDriver::returned(BR_SPAWN_LOOPER));
+  serve_script();
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  while (kernel_.threads_ended() < 2 && std::chrono::steady_clock::now() < deadline) {
+    std::this_thread::sleep_for(std::chrono::milliseconds(1));
+  }
+  EXPECT_EQ(2, kernel_.threads_ended()) << "the pool's first thread and the one that was asked for";
+  EXPECT_THAT(kernel_.written(BC_REGISTER_LOOPER), SizeIs(1));
+  EXPECT_THAT(kernel_.written(BC_ENTER_LOOPER), SizeIs(2));
+  EXPECT_THAT(kernel_.written(BC_EXIT_LOOPER), SizeIs(3));
+  EXPECT_EQ(15U, kernel_.max_threads());
+}
+
+TEST_F(RemoteTest, ServiceManagerSpeaksItsProtocol) {
+  kernel_.add_reply({});  // the ping
+  const sp<IServiceManager> manager = defaultServiceManager();
+  ASSERT_NE(nullptr, manager);
+  Parcel null;
+  null.writeStrongBinder(nullptr);
+  const std::string no_service(reinterpret_cast<const char*>(null.data()), null.dataSize());
+  const String16 name("sentrova.rescue");
+
+  kernel_.add_reply(no_service);
+  EXPECT_EQ(nullptr, manager->checkService(name));
+  kernel_.add_reply(no_service);
+  kernel_.add_reply(object_bytes(BINDER_TYPE_HANDLE, 9), {0});
+  const sp<IBinder> service = manager->getService(name);
+  ASSERT_NE(nullptr, service) << "waited for";
+  EXPECT_EQ(9, service->remoteBinder()->handle());
+
+  binder_transaction_data refused = kernel_.deliver(words({PERMISSION_DENIED}));
+  refused.flags = TF_STATUS_CODE;
+  kernel_.add_step(FakeDriver::returned(BR_REPLY, refused));
+  const sp<IBinder> local = new BBinder();
+  EXPECT_EQ(PERMISSION_DENIED, manager->addService(name, local));
+  const auto sent = kernel_.written(BC_TRANSACTION);
+  const auto& add = sent.back();
+  EXPECT_EQ(uint32_t{IServiceManager::ADD_SERVICE_TRANSACTION},
+            add.as<binder_transaction_data>().code);
+  ASSERT_THAT(add.offsets, SizeIs(1));
+  flat_binder_object object;
+  memcpy(&object, add.data.data() + add.offsets[0], sizeof(object));
+  EXPECT_EQ(uint32_t{BINDER_TYPE_BINDER}, object.hdr.type);
+  EXPECT_EQ(reinterpret_cast<uintptr_t>(local.get()), object.cookie);
+
+  Parcel list;
+  list.writeInt32(1000);
+  list.writeString16(name);
+  kernel_.add_reply({reinterpret_cast<const char*>(list.data()), list.dataSize()});
+  EXPECT_EQ(1U, manager->listServices().size()) << "as many as there are, whatever the count says";
+
+  // The manager dies, and with it this process's reference to it.
+  kernel_.add_step(FakeDriver::returned(BR_DEAD_REPLY));
+  EXPECT_EQ(nullptr, manager->checkService(name));
+  EXPECT_EQ(nullptr, manager->getService(name)) << "no use waiting for the dead";
+}
+
+TEST_F(RemoteTest, SurvivesAHostileDriver) {
+  const std::string two_objects =
+      object_bytes(BINDER_TYPE_HANDLE, 5) + object_bytes(BINDER_TYPE_HANDLE, 6);
+  using Damage = void (*)(binder_transaction_data*);
+  const Damage none = [](binder_transaction_data*) {};
+  const struct {
+    const char* what;
+    std::string data;
+    std::vector<uint64_t> offsets;
+    Damage damage;
+  } cases[] = {
+      {"offset outside the data", two_objects, {48}, none},
+      {"offset far outside", two_objects, {UINT64_MAX - 3}, none},
+      {"object over the end", two_objects, {28}, none},
+      {"misaligned offset", two_objects, {2}, none},
+      {"offsets in descending order", two_objects, {24, 0}, none},
+      {"the same object twice", two_objects, {0, 0}, none},
+      {"overlapping objects", two_objects, {0, 4}, none},
+      {"unknown type", words({1, 2, 3, 4, 5, 6}), {0}, none},
+      {"half an offset", two_objects, {0}, [](auto* t) { t->offsets_size = 4; }},
+      {"offsets outside the area", two_objects, {0}, [](auto* t) { t->data.ptr.offsets = 8; }},
+      {"offsets over the area's end",
+       two_objects,
+       {0},
+       [](auto* t) { t->offsets_size = UINT64_MAX - 7; }},
+      {"data over the area's end", two_objects, {}, [](auto* t) { t->data_size = 1U << 20; }},
+      {"data that wraps", two_objects, {}, [](auto* t) { t->data_size = UINT64_MAX; }},
+      {"misaligned data", two_objects, {}, [](auto* t) { t->data.ptr.buffer += 2; }},
+      {"data outside the area", two_objects, {}, [](auto* t) { t->data.ptr.buffer = 0; }},
+  };
+  for (const auto& item : cases) {
+    SCOPED_TRACE(item.what);
+    kernel_.restart();
+    binder_transaction_data answer = kernel_.deliver(item.data, item.offsets);
+    const uint64_t buffer = answer.data.ptr.buffer;
+    item.damage(&answer);
+    kernel_.add_step(FakeDriver::returned(BR_REPLY, answer));
+    Parcel reply;
+    EXPECT_EQ(BAD_VALUE, call(&reply));
+    EXPECT_EQ(0U, reply.dataSize());
+
+    const sp<IBinder> object = new Handler([](const Parcel&, Parcel*) { return OK; });
+    aim_at(&answer, object);
+    kernel_.add_step(FakeDriver::returned(BR_TRANSACTION, answer));
+    kernel_.add_step(FakeDriver::returned(BR_TRANSACTION_COMPLETE));
+    serve_script();
+    ASSERT_THAT(kernel_.written(BC_REPLY), SizeIs(1));
+    EXPECT_EQ(words({BAD_VALUE}), kernel_.written(BC_REPLY)[0].data);
+    const size_t given_back = answer.data.ptr.buffer == buffer ? 2 : 0;
+    EXPECT_THAT(kernel_.written(BC_FREE_BUFFER), SizeIs(given_back));
+  }
+}
+
+TEST_F(RemoteTest, SurvivesHalfReturns) {
+  const std::string whole = FakeDriver::returned(BR_REPLY, kernel_.deliver(words({1})));
+  for (size_t length = 0; length < whole.size(); length += 3) {
+    kernel_.add_step(whole.substr(0, length));
+    EXPECT_EQ(UNKNOWN_ERROR, call(nullptr)) << length;
+  }
+  kernel_.miscount_next();
+  EXPECT_EQ(-EPROTO, call(nullptr));
+  kernel_.add_step(FakeDriver::returned(_IOR('r', 99, uint64_t), uint64_t{1}) +
+                   FakeDriver::returned(BR_DEAD_REPLY));
+  EXPECT_EQ(DEAD_OBJECT, call(nullptr)) << "unknown returns are skipped by their size";
+  for (int i = 0; i < 100; ++i)
+    kernel_.add_step({});
+  serve_script();
+  EXPECT_THAT(kernel_.written(BC_EXIT_LOOPER), SizeIs(1));
+  EXPECT_FALSE(kernel_.script_is_over()) << "no endless loop over a silent driver";
+  kernel_.restart();
+}
+
+}  // namespace
+}  // namespace android

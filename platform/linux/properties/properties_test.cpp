@@ -1,0 +1,257 @@
+#include <android-base/file.h>
+#include <android-base/properties.h>
+#include <android-base/unique_fd.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+#include <utils/String8.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <functional>
+#include <thread>
+#include <vector>
+
+namespace {
+
+using android::base::GetBoolProperty;
+using android::base::GetIntProperty;
+using android::base::GetProperty;
+using android::base::GetUintProperty;
+using android::base::SetProperty;
+using android::base::WriteStringToFile;
+
+class Properties : public testing::Test {
+ protected:
+  Properties() { setenv("ANDROID_PROPERTY_DIR", folder_.path, 1); }
+  ~Properties() override { unsetenv("ANDROID_PROPERTY_DIR"); }
+
+  std::string path(const std::string& name) const { return folder_.path + ("/" + name); }
+
+  size_t file_count() const {
+    size_t count = 0;
+    for ([[maybe_unused]] const auto& entry : std::filesystem::directory_iterator(folder_.path)) {
+      ++count;
+    }
+    return count;
+  }
+
+  TemporaryDir folder_;
+};
+
+// Runs `body` in `count` processes that start together; returns how many of them got true.
+int count_of_true(int count, const std::function<bool(int)>& body) {
+  android::base::unique_fd wait_end;
+  android::base::unique_fd go_end;
+  if (!android::base::Pipe(&wait_end, &go_end)) {
+    return -1;
+  }
+  std::vector<pid_t> children;
+  for (int i = 0; i < count; ++i) {
+    const pid_t child = fork();
+    if (child == 0) {
+      go_end.reset();
+      char byte = 0;
+      const ssize_t end_of_file = read(wait_end.get(), &byte, 1);
+      _exit(end_of_file == 0 && body(i) ? 0 : 1);
+    }
+    children.push_back(child);
+  }
+  go_end.reset();
+  int true_count = 0;
+  for (const pid_t child : children) {
+    int status = -1;
+    waitpid(child, &status, 0);
+    true_count += WIFEXITED(status) && WEXITSTATUS(status) == 0 ? 1 : 0;
+  }
+  return true_count;
+}
+
+TEST_F(Properties, ReachAnotherProcessAndComeBack) {
+  ASSERT_TRUE(SetProperty("recovery.question", "6x7"));
+  ASSERT_EQ(1, count_of_true(1, [](int) {
+              return GetProperty("recovery.question", "") == "6x7" &&
+                     SetProperty("recovery.answer", "42");
+            }));
+  EXPECT_EQ("42", GetProperty("recovery.answer", "none"));
+  EXPECT_EQ("none", GetProperty("recovery.other", "none"));
+}
+
+TEST_F(Properties, AreSeenByLibbasesOwnReaders) {
+  ASSERT_TRUE(WriteStringToFile("42", path("test.number")));
+  ASSERT_TRUE(WriteStringToFile("yes", path("test.truth")));
+  EXPECT_EQ(42, GetIntProperty<int>("test.number", 0));
+  EXPECT_EQ(42u, GetUintProperty<uint64_t>("test.number", 0));
+  EXPECT_EQ(7, GetIntProperty<int>("test.number", 7, 0, 41));
+  EXPECT_TRUE(GetBoolProperty("test.truth", false));
+}
+
+// The program links a library that needs libbase before it links the store.
+TEST_F(Properties, ComeBeforeLibbaseWhateverElseIsLinked) {
+  ASSERT_TRUE(SetProperty("test.order", android::String8("first").string()));
+  EXPECT_TRUE(std::filesystem::exists(path("test.order")));
+}
+
+TEST_F(Properties, EmptyValueReadsAsTheDefault) {
+  ASSERT_TRUE(SetProperty("test.empty", "x"));
+  ASSERT_TRUE(SetProperty("test.empty", ""));
+  EXPECT_EQ("default", GetProperty("test.empty", "default"));
+}
+
+TEST_F(Properties, AreReadableByAllWhateverTheMask) {
+  const mode_t mask = umask(077);
+  ASSERT_TRUE(SetProperty("test.mode", "x"));
+  umask(mask);
+  EXPECT_EQ(std::filesystem::perms(0644), std::filesystem::status(path("test.mode")).permissions());
+}
+
+TEST_F(Properties, ConcurrentWritersNeverShowAMixedValue) {
+  constexpr int kWriters = 4;
+  constexpr int kRounds = 200;
+  ASSERT_TRUE(SetProperty("test.shared", std::string(91, 'z')));
+  EXPECT_EQ(kWriters, count_of_true(kWriters, [](int writer) {
+              const std::string mine(91, static_cast<char>('a' + writer));
+              for (int i = 0; i < kRounds; ++i) {
+                const std::string seen = GetProperty("test.shared", "");
+                if (seen.empty() || seen != std::string(91, seen[0]) ||
+                    !SetProperty("test.shared", mine)) {
+                  return false;
+                }
+              }
+              return true;
+            }));
+  EXPECT_EQ(1u, file_count()) << "a writer left its new file behind";
+}
+
+TEST_F(Properties, ReadOnlyHasOneWinnerOfEightProcesses) {
+  for (int round = 0; round < 20; ++round) {
+    const std::string name = "ro.race." + std::to_string(round);
+    EXPECT_EQ(1, count_of_true(8, [&](int writer) {
+                const std::string mine = "writer" + std::to_string(writer);
+                return SetProperty(name, mine) && GetProperty(name, "") == mine;
+              }));
+  }
+  EXPECT_EQ(20u, file_count()) << "a loser left its new file behind";
+}
+
+TEST_F(Properties, ReadOnlyKeepsItsFirstValueEvenAnEmptyOne) {
+  ASSERT_TRUE(SetProperty("ro.kept", "first"));
+  ASSERT_TRUE(SetProperty("ro.empty", ""));
+  for (const char* name : {"ro.kept", "ro.empty"}) {
+    errno = 0;
+    EXPECT_FALSE(SetProperty(name, "second"));
+    EXPECT_EQ(EEXIST, errno);
+  }
+  EXPECT_EQ("first", GetProperty("ro.kept", ""));
+  EXPECT_EQ("default", GetProperty("ro.empty", "default"));
+}
+
+TEST_F(Properties, GoodNames) {
+  const std::string names[] = {
+      "a", "sys.powerctl",       "A_b-C:d@e.9", "-x", "ro", "persist.a.b.c", "init.svc.x",
+      "9", std::string(255, 'n')};
+  for (const std::string& name : names) {
+    EXPECT_TRUE(SetProperty(name, "v")) << name;
+    EXPECT_EQ("v", GetProperty(name, "")) << name;
+  }
+}
+
+TEST_F(Properties, BadNamesChangeNothingAndReadAsTheDefault) {
+  const std::string names[] = {"",
+                               ".",
+                               "..",
+                               ".a",
+                               "a.",
+                               "a..b",
+                               "a/b",
+                               "/a",
+                               "../escaped",
+                               "a b",
+                               "a\n",
+                               "a=b",
+                               "\xc3\xa9",
+                               std::string("a\0b", 3),
+                               std::string(256, 'n')};
+  for (const std::string& name : names) {
+    errno = 0;
+    EXPECT_FALSE(SetProperty(name, "v")) << name;
+    EXPECT_EQ(EINVAL, errno) << name;
+    EXPECT_EQ("default", GetProperty(name, "default")) << name;
+  }
+  EXPECT_EQ(0u, file_count());
+  EXPECT_FALSE(std::filesystem::exists(path("../escaped")));
+}
+
+TEST_F(Properties, ValuesUpToTheLimitOfTheirKind) {
+  const struct {
+    const char* name;
+    size_t limit;
+  } cases[] = {{"test.value", 91}, {"ro.value", 4096}};
+  for (const auto& [name, limit] : cases) {
+    errno = 0;
+    EXPECT_FALSE(SetProperty(name, std::string(limit + 1, 'v')));
+    EXPECT_EQ(EINVAL, errno);
+    EXPECT_FALSE(SetProperty(name, std::string("a\0b", 3)));
+    EXPECT_EQ("unset", GetProperty(name, "unset"));
+    EXPECT_TRUE(SetProperty(name, std::string(limit, 'v')));
+    EXPECT_EQ(std::string(limit, 'v'), GetProperty(name, ""));
+  }
+}
+
+TEST_F(Properties, HostileStoreReadsAsTheDefault) {
+  ASSERT_TRUE(WriteStringToFile(std::string(92, 'x'), path("test.long")));
+  ASSERT_TRUE(WriteStringToFile(std::string("a\0b", 3), path("test.nul")));
+  ASSERT_TRUE(WriteStringToFile("", path("test.huge")));
+  ASSERT_EQ(0, truncate(path("test.huge").c_str(), off_t{1} << 40));
+  ASSERT_TRUE(WriteStringToFile("secret", path("target")));
+  ASSERT_EQ(0, symlink("target", path("test.link").c_str()));
+  ASSERT_EQ(0, mkfifo(path("test.fifo").c_str(), 0600));
+  ASSERT_EQ(0, mkdir(path("test.folder").c_str(), 0700));
+  for (const char* name :
+       {"test.long", "test.nul", "test.huge", "test.link", "test.fifo", "test.folder"}) {
+    EXPECT_EQ("default", GetProperty(name, "default")) << name;
+  }
+  const size_t count = file_count();
+  EXPECT_FALSE(SetProperty("test.folder", "v"));
+  EXPECT_TRUE(SetProperty("test.link", "v"));
+  EXPECT_EQ("secret", GetProperty("target", "")) << "a set went through a symbolic link";
+  EXPECT_EQ(count, file_count());
+}
+
+TEST(PropertiesWithoutFolder, AreTheProcesssOwn) {
+  const TemporaryDir parent;
+  const std::string folder = parent.path + std::string("/absent");
+  setenv("ANDROID_PROPERTY_DIR", folder.c_str(), 1);
+  ASSERT_TRUE(SetProperty("test.own", "mine"));
+  ASSERT_TRUE(SetProperty("ro.own", "first"));
+  EXPECT_FALSE(SetProperty("ro.own", "second"));
+  EXPECT_FALSE(SetProperty("../escaped", "x"));
+  EXPECT_EQ("mine", GetProperty("test.own", ""));
+  EXPECT_EQ("first", GetProperty("ro.own", ""));
+  EXPECT_FALSE(std::filesystem::exists(folder));
+  ASSERT_EQ(0, mkdir(folder.c_str(), 0755));
+  EXPECT_EQ("unset", GetProperty("test.own", "unset"));
+  unsetenv("ANDROID_PROPERTY_DIR");
+}
+
+TEST(PropertiesWithoutFolder, ServeManyThreads) {
+  const TemporaryDir parent;
+  setenv("ANDROID_PROPERTY_DIR", (parent.path + std::string("/absent")).c_str(), 1);
+  std::vector<std::thread> threads;
+  for (int i = 0; i < 4; ++i) {
+    threads.emplace_back([i] {
+      for (int round = 0; round < 200; ++round) {
+        EXPECT_TRUE(SetProperty("test.thread" + std::to_string(i), std::to_string(round)));
+        EXPECT_EQ(round, GetIntProperty<int>("test.thread" + std::to_string(i), -1));
+      }
+    });
+  }
+  for (std::thread& thread : threads) {
+    thread.join();
+  }
+  unsetenv("ANDROID_PROPERTY_DIR");
+}
+
+}  // namespace

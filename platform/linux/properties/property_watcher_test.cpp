@@ -1,0 +1,106 @@
+#include "platform/linux/properties/property_watcher.h"
+
+#include <android-base/file.h>
+#include <android-base/properties.h>
+#include <fcntl.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <fstream>
+#include <thread>
+
+namespace sentrova {
+namespace {
+
+using android::base::SetProperty;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using namespace std::chrono_literals;
+
+class PropertyWatcherTest : public testing::Test {
+ protected:
+  PropertyWatcherTest() { setenv("ANDROID_PROPERTY_DIR", folder_.path, 1); }
+  ~PropertyWatcherTest() override { unsetenv("ANDROID_PROPERTY_DIR"); }
+
+  TemporaryDir folder_;
+};
+
+TEST_F(PropertyWatcherTest, TellsEachChangedNameOnceAndNoTemporaryFile) {
+  std::optional<PropertyWatcher> watcher = PropertyWatcher::create();
+  ASSERT_TRUE(watcher);
+  ASSERT_TRUE(SetProperty("ctl.start", "one"));
+  ASSERT_TRUE(SetProperty("ro.fixed", "value"));
+  ASSERT_TRUE(SetProperty("ctl.start", "two"));
+  ASSERT_TRUE(android::base::WriteStringToFile("v", folder_.path + std::string("/by.hand")));
+  const std::optional<PropertyChanges> changes = watcher->wait(0ms);
+  ASSERT_TRUE(changes);
+  EXPECT_THAT(changes->names, ElementsAre("ctl.start", "ro.fixed", "by.hand"));
+  EXPECT_FALSE(changes->rescan);
+  EXPECT_THAT(watcher->wait(0ms)->names, IsEmpty());
+}
+
+TEST_F(PropertyWatcherTest, RefusedSetIsNoChange) {
+  ASSERT_TRUE(SetProperty("ro.fixed", "value"));
+  std::optional<PropertyWatcher> watcher = PropertyWatcher::create();
+  ASSERT_TRUE(watcher);
+  EXPECT_FALSE(SetProperty("ro.fixed", "other"));
+  EXPECT_THAT(watcher->wait(0ms)->names, IsEmpty());
+}
+
+TEST_F(PropertyWatcherTest, WakesForAChangeWhileItWaits) {
+  std::optional<PropertyWatcher> watcher = PropertyWatcher::create();
+  ASSERT_TRUE(watcher);
+  std::thread setter([] {
+    std::this_thread::sleep_for(50ms);
+    SetProperty("sys.powerctl", "reboot");
+  });
+  std::vector<std::string> names;
+  const auto deadline = std::chrono::steady_clock::now() + 10s;
+  while (names.empty() && std::chrono::steady_clock::now() < deadline) {
+    names = watcher->wait(10s)->names;
+  }
+  setter.join();
+  EXPECT_THAT(names, ElementsAre("sys.powerctl"));
+}
+
+TEST_F(PropertyWatcherTest, LostChangesAskForARescan) {
+  std::optional<PropertyWatcher> watcher = PropertyWatcher::create();
+  ASSERT_TRUE(watcher);
+  int queue_length = 0;
+  std::ifstream("/proc/sys/fs/inotify/max_queued_events") >> queue_length;
+  if (queue_length <= 0 || queue_length > 100000) {
+    GTEST_SKIP() << "the kernel's queue of " << queue_length << " events is not to be filled here";
+  }
+  const std::string path = folder_.path + std::string("/test.flood");
+  for (int i = 0; i <= queue_length / 2; ++i) {
+    const android::base::unique_fd fd(open(path.c_str(), O_CREAT | O_RDONLY | O_CLOEXEC, 0600));
+    ASSERT_TRUE(fd.ok());
+    ASSERT_EQ(0, unlink(path.c_str()));
+  }
+  bool rescan = false;
+  for (int reads = 0; !rescan && reads < queue_length; ++reads) {
+    rescan = watcher->wait(0ms)->rescan;
+  }
+  EXPECT_TRUE(rescan);
+  ASSERT_TRUE(SetProperty("test.after", "v"));
+  EXPECT_THAT(watcher->wait(0ms)->names, ElementsAre("test.after"));
+}
+
+TEST_F(PropertyWatcherTest, EndsWithTheFolder) {
+  const std::string folder = folder_.path + std::string("/store");
+  EXPECT_FALSE(PropertyWatcher::create(folder));
+  ASSERT_EQ(0, mkdir(folder.c_str(), 0700));
+  std::optional<PropertyWatcher> watcher = PropertyWatcher::create(folder);
+  ASSERT_TRUE(watcher);
+  ASSERT_EQ(0, rmdir(folder.c_str()));
+  errno = 0;
+  EXPECT_FALSE(watcher->wait(0ms));
+  EXPECT_EQ(ENOENT, errno);
+}
+
+}  // namespace
+}  // namespace sentrova

@@ -1,0 +1,186 @@
+#include "platform/linux/servicemanager/service_directory.h"
+
+#include <gtest/gtest.h>
+
+#include <random>
+#include <string>
+#include <vector>
+
+#include "binder/Parcel.h"
+
+namespace sentrova {
+namespace {
+
+using android::BBinder;
+using android::IBinder;
+using android::IServiceManager;
+using android::Parcel;
+using android::sp;
+using android::status_t;
+using android::String16;
+using android::wp;
+
+// A service whose death the test decides.
+class Mortal : public BBinder {
+ public:
+  status_t linkToDeath(const sp<DeathRecipient>& recipient, void*, uint32_t) override {
+    if (dead)
+      return android::DEAD_OBJECT;
+    recipients.push_back(recipient);
+    return android::OK;
+  }
+  status_t unlinkToDeath(const wp<DeathRecipient>& recipient, void*, uint32_t,
+                         wp<DeathRecipient>*) override {
+    std::erase(recipients, recipient);
+    return android::OK;
+  }
+  void die() {
+    dead = true;
+    for (const auto& recipient : recipients) {
+      if (const auto told = recipient.promote(); told != nullptr)
+        told->binderDied(this);
+    }
+  }
+
+  bool dead = false;
+  std::vector<wp<DeathRecipient>> recipients;
+};
+
+class ServiceDirectoryTest : public testing::Test {
+ protected:
+  status_t call(uint32_t code, const Parcel& data, Parcel* reply) {
+    return IServiceManager::asBinder(directory_)->transact(code, data, reply);
+  }
+  status_t add(const String16& name, const sp<IBinder>& service) {
+    return directory_->addService(name, service, false, 0);
+  }
+
+  uid_t uid_ = 0;
+  const sp<ServiceDirectory> directory_ = new ServiceDirectory([this] { return uid_; });
+};
+
+TEST_F(ServiceDirectoryTest, AnswersItsProtocol) {
+  const sp<IBinder> service = new BBinder();
+  Parcel add;
+  add.writeInterfaceToken(IServiceManager::descriptor);
+  add.writeString16(String16("sentrova.rescue"));
+  add.writeStrongBinder(service);
+  add.writeBool(false);
+  add.writeInt32(IServiceManager::DUMP_FLAG_PRIORITY_DEFAULT);
+  Parcel reply;
+  ASSERT_EQ(android::OK, call(IServiceManager::ADD_SERVICE_TRANSACTION, add, &reply));
+
+  for (const uint32_t code : {uint32_t{IServiceManager::GET_SERVICE_TRANSACTION},
+                              uint32_t{IServiceManager::CHECK_SERVICE_TRANSACTION}}) {
+    for (const bool known : {true, false}) {
+      Parcel check;
+      check.writeInterfaceToken(IServiceManager::descriptor);
+      check.writeString16(String16(known ? "sentrova.rescue" : "sentrova"));
+      Parcel found;
+      ASSERT_EQ(android::OK, call(code, check, &found));
+      sp<IBinder> answer = new BBinder();
+      EXPECT_EQ(android::OK, found.readNullableStrongBinder(&answer));
+      EXPECT_EQ(known ? service : nullptr, answer);
+    }
+  }
+
+  Parcel list;
+  list.writeInterfaceToken(IServiceManager::descriptor);
+  list.writeInt32(IServiceManager::DUMP_FLAG_PRIORITY_ALL);
+  Parcel names;
+  ASSERT_EQ(android::OK, call(IServiceManager::LIST_SERVICES_TRANSACTION, list, &names));
+  EXPECT_EQ(1, names.readInt32());
+  EXPECT_EQ(String16("sentrova.rescue"), names.readString16());
+}
+
+TEST_F(ServiceDirectoryTest, LetsOnlyRootAndSystemAdd) {
+  const struct {
+    uid_t uid;
+    status_t status;
+  } cases[] = {{0, android::OK},
+               {1000, android::OK},
+               {1, android::PERMISSION_DENIED},
+               {2000, android::PERMISSION_DENIED},
+               {10057, android::PERMISSION_DENIED},
+               {101000, android::PERMISSION_DENIED}};
+  for (const auto& item : cases) {
+    uid_ = item.uid;
+    const String16 name(std::to_string(item.uid).c_str());
+    EXPECT_EQ(item.status, add(name, new BBinder())) << item.uid;
+    EXPECT_EQ(item.status == android::OK, directory_->checkService(name) != nullptr) << item.uid;
+  }
+}
+
+TEST_F(ServiceDirectoryTest, ChecksNames) {
+  EXPECT_EQ(android::BAD_VALUE, add(String16("null"), nullptr));
+  const std::string longest(127, 'x');
+  for (const std::string& good : {std::string("a"), longest, std::string("A.b_c-d/e:9")}) {
+    EXPECT_EQ(android::OK, add(String16(good.c_str()), new BBinder())) << good;
+  }
+  for (const std::string& bad :
+       {std::string(), longest + "x", std::string("a b"), std::string("a\n"),
+        std::string("a\0b", 3), std::string("\xc3\xa9"), std::string("a*")}) {
+    EXPECT_EQ(android::BAD_VALUE, add(String16(bad.data(), bad.size()), new BBinder())) << bad;
+  }
+}
+
+TEST_F(ServiceDirectoryTest, IsBounded) {
+  for (size_t i = 0; i < ServiceDirectory::kMaxServices; ++i) {
+    ASSERT_EQ(android::OK, add(String16(std::to_string(i).c_str()), new BBinder()));
+  }
+  EXPECT_EQ(android::NO_MEMORY, add(String16("one.more"), new BBinder()));
+  EXPECT_EQ(android::OK, add(String16("7"), new BBinder())) << "replacing takes no room";
+}
+
+TEST_F(ServiceDirectoryTest, ForgetsTheDeadButNotTheirSuccessors) {
+  const sp<Mortal> first = new Mortal();
+  const sp<Mortal> second = new Mortal();
+  const String16 name("sentrova.rescue");
+  ASSERT_EQ(android::OK, add(name, first));
+  ASSERT_EQ(android::OK, add(String16("other"), first));
+  const auto late = first->recipients;
+  ASSERT_EQ(android::OK, add(name, second));
+  EXPECT_EQ(1U, first->recipients.size()) << "the replaced entry watches no more";
+  first->die();
+  for (const auto& recipient : late) {
+    if (const auto told = recipient.promote(); told != nullptr)
+      told->binderDied(first);
+  }
+  EXPECT_EQ(second, directory_->checkService(name));
+  EXPECT_EQ(nullptr, directory_->checkService(String16("other")));
+  EXPECT_EQ(android::DEAD_OBJECT, add(name, first)) << "a dead service is not entered";
+  EXPECT_EQ(second, directory_->checkService(name));
+  second->die();
+  EXPECT_EQ(0U, directory_->listServices(0).size());
+}
+
+TEST_F(ServiceDirectoryTest, RefusesAStrangersToken) {
+  for (const uint32_t code : {1U, 2U, 3U, 4U}) {
+    Parcel data;
+    data.writeInterfaceToken(String16("sentrova.test"));
+    Parcel reply;
+    EXPECT_EQ(android::PERMISSION_DENIED, call(code, data, &reply)) << code;
+    EXPECT_EQ(0U, reply.dataSize());
+  }
+}
+
+TEST_F(ServiceDirectoryTest, SurvivesAnyParcel) {
+  std::mt19937 random(20);
+  for (int round = 0; round < 4000; ++round) {
+    Parcel data;
+    if (round % 4 != 0)
+      data.writeInterfaceToken(IServiceManager::descriptor);
+    const size_t count = random() % 12;
+    for (size_t i = 0; i < count; ++i) {
+      data.writeUint32(random() % 3 == 0 ? static_cast<uint32_t>(random()) : random() % 8);
+    }
+    Parcel reply;
+    const status_t status = call(static_cast<uint32_t>(round % 6), data, &reply);
+    const bool adds = round % 6 == IServiceManager::ADD_SERVICE_TRANSACTION;
+    EXPECT_FALSE(adds && status == android::OK) << "there was no object in it";
+  }
+  EXPECT_EQ(0U, directory_->listServices(0).size());
+}
+
+}  // namespace
+}  // namespace sentrova
