@@ -1,0 +1,33 @@
+#include "tests/support/process_limits.h"
+
+#include <android-base/unique_fd.h>
+#include <errno.h>
+#include <fcntl.h>
+#include <sys/resource.h>
+#include <sys/types.h>
+#include <unistd.h>
+
+namespace sentrova::testing {
+
+bool forbid_new_processes() {
+  const rlimit none = {};
+  constexpr uid_t kNobody = 65534;
+  // In a user namespace root has nobody else to become, and the limit holds for it as it is.
+  if (setrlimit(RLIMIT_NPROC, &none) != 0 || (setuid(kNobody) != 0 && errno != EINVAL)) {
+    return false;
+  }
+  const pid_t pid = fork();
+  if (pid == 0) {
+    _exit(0);
+  }
+  return pid == -1 && errno == EAGAIN;
+}
+
+bool forbid_new_descriptors() {
+  const android::base::unique_fd lowest(open("/dev/null", O_RDONLY | O_CLOEXEC));
+  const rlim_t one_more = static_cast<rlim_t>(lowest.get()) + 1;
+  const rlimit limit = {.rlim_cur = one_more, .rlim_max = one_more};
+  return lowest != -1 && setrlimit(RLIMIT_NOFILE, &limit) == 0;
+}
+
+}  // namespace sentrova::testing
