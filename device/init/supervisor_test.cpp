@@ -1,0 +1,135 @@
+#include "device/init/supervisor.h"
+
+#include <android-base/file.h>
+#include <android-base/properties.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <stdlib.h>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+
+#include <filesystem>
+
+#include "device/init/process.h"
+
+namespace sentrova::device {
+namespace {
+
+// A property store, services that sleep, and a main program that is a line of shell.
+class SupervisorTest : public testing::Test {
+ protected:
+  void SetUp() override {
+    std::filesystem::create_directory(path("properties"));
+    setenv("ANDROID_PROPERTY_DIR", path("properties").c_str(), 1);
+    supervisor_ = Supervisor::create(services_);
+    ASSERT_TRUE(supervisor_);
+  }
+
+  void TearDown() override {
+    services_.stop("first");
+    services_.stop("second");
+    unsetenv("ANDROID_PROPERTY_DIR");
+    for (const auto& entry : std::filesystem::directory_iterator(folder_.path)) {
+      std::filesystem::remove_all(entry);
+    }
+  }
+
+  std::string path(const std::string& name) const { return std::string(folder_.path) + "/" + name; }
+
+  pid_t start(const std::string& script) {
+    return start_process({{"/bin/sh", "-c", script}, path("main.log"), ""});
+  }
+
+  // The shell's way to set a property: beside it and renamed, as any other process would.
+  std::string set(const std::string& name, const std::string& value) const {
+    return "echo -n '" + value + "' >" + path("draft") + "; mv " + path("draft") + " " +
+           path("properties/") + name + ";";
+  }
+
+  std::optional<Ending> run(const std::string& script) {
+    return supervisor_->run_until_end(start(script));
+  }
+
+  static std::string state(const std::string& service) {
+    return android::base::GetProperty("init.svc." + service, "");
+  }
+
+  std::string text(const std::string& name) const {
+    std::string text;
+    android::base::ReadFileToString(path(name), &text);
+    return text;
+  }
+
+  TemporaryDir folder_;
+  Services services_{{{"first", {"/bin/sh", "-c", "echo $$; exec sleep 60"}},
+                      {"second", {"/bin/sh", "-c", "exec sleep 60"}},
+                      {"absent", {"/nowhere/program"}}},
+                     folder_.path};
+  std::optional<Supervisor> supervisor_;
+};
+
+TEST_F(SupervisorTest, TellsHowTheMainProgramEnded) {
+  const auto exited = run("exit 7");
+  ASSERT_TRUE(exited);
+  EXPECT_FALSE(exited->power_request);
+  EXPECT_EQ(shell_status(exited->main_wait_status), 7);
+
+  const auto killed = run("kill -9 $$");
+  ASSERT_TRUE(killed);
+  EXPECT_EQ(shell_status(killed->main_wait_status), 128 + SIGKILL);
+}
+
+TEST_F(SupervisorTest, AnswersQuickRequestsOfDifferentNames) {
+  ASSERT_TRUE(services_.start("second"));
+  ASSERT_TRUE(run(set("ctl.start", "first") + set("ctl.stop", "second")));
+  EXPECT_EQ(state("first"), "running");
+  EXPECT_EQ(state("second"), "stopped");
+}
+
+TEST_F(SupervisorTest, IgnoresRequestsItCannotMeet) {
+  ASSERT_TRUE(run(set("ctl.start", "unheard.of") + set("ctl.stop", "../first") +
+                  set("sys.powerctl", "explode")));
+  ASSERT_TRUE(run(set("ctl.start", "absent")));
+  EXPECT_EQ(state("absent"), "");
+}
+
+TEST_F(SupervisorTest, SeesAServiceDieAndStartsItAgain) {
+  // The service writes its process id to its log.
+  ASSERT_TRUE(services_.start("first"));
+  ASSERT_TRUE(run("while ! test -s " + path("first.log") + "; do sleep 0.01; done; kill -9 $(cat " +
+                  path("first.log") + "); while test -d /proc/$(cat " + path("first.log") +
+                  "); do sleep 0.01; done"));
+  EXPECT_EQ(state("first"), "stopped");
+  ASSERT_TRUE(run(set("ctl.start", "first")));
+  EXPECT_EQ(state("first"), "running");
+}
+
+TEST_F(SupervisorTest, ReapsOrphans) {
+  ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 1), 0);
+  // The orphan outlives its parent and is gone when the main program ends.
+  ASSERT_TRUE(run("sh -c 'sleep 0.1 & echo $! >" + path("orphan") + "'; sleep 0.3"));
+  const pid_t orphan = atoi(text("orphan").c_str());
+  ASSERT_GT(orphan, 0);
+  EXPECT_EQ(waitpid(orphan, nullptr, WNOHANG), -1);
+  EXPECT_EQ(errno, ECHILD);
+  ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 0), 0);
+}
+
+TEST_F(SupervisorTest, HandsAPowerRequestBack) {
+  const pid_t main_program = start(set("sys.powerctl", "reboot,recovery") + "sleep 60");
+  const auto ending = supervisor_->run_until_end(main_program);
+  ASSERT_TRUE(ending);
+  ASSERT_TRUE(ending->power_request);
+  EXPECT_TRUE(ending->power_request->reboot);
+  EXPECT_EQ(ending->power_request->reason, "recovery");
+  kill(-main_program, SIGKILL);
+  EXPECT_EQ(waitpid(main_program, nullptr, 0), main_program);
+}
+
+TEST_F(SupervisorTest, StartsProcessesWithoutBlockedSignals) {
+  ASSERT_TRUE(run("grep SigBlk /proc/self/status"));
+  EXPECT_EQ(text("main.log"), "SigBlk:\t0000000000000000\n");
+}
+
+}  // namespace
+}  // namespace sentrova::device

@@ -1,0 +1,157 @@
+#include "device/zunogatekeeper/provision.h"
+
+#include <android-base/file.h>
+#include <android-base/properties.h>
+#include <android-base/unique_fd.h>
+#include <gtest/gtest.h>
+#include <stdlib.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <vector>
+
+#include "device/zunogatekeeper/credential_store.h"
+
+namespace sentrova {
+namespace {
+
+class Provision : public testing::Test {
+ protected:
+  // Runs the command with `input` on its standard input; keeps what it said.
+  int run(std::vector<std::string> arguments, const std::string& input) {
+    const TemporaryFile file;
+    EXPECT_TRUE(android::base::WriteStringToFd(input, file.fd));
+    EXPECT_EQ(0, lseek(file.fd, 0, SEEK_SET));
+    arguments.insert(arguments.begin(), "provision_credential");
+    std::vector<char*> argv;
+    for (std::string& argument : arguments) {
+      argv.push_back(argument.data());
+    }
+    argv.push_back(nullptr);
+    testing::internal::CaptureStderr();
+    testing::internal::CaptureStdout();
+    const int status = provision(static_cast<int>(arguments.size()), argv.data(), file.fd);
+    said_ = testing::internal::GetCapturedStdout() + testing::internal::GetCapturedStderr();
+    return status;
+  }
+
+  bool has_password(int status, std::string_view password) {
+    std::string error;
+    const std::optional<Credential> stored = read_credential(store_, 0, error);
+    EXPECT_TRUE(stored) << error;
+    return stored && stored->status == status &&
+           has_digest(password, stored->salt, stored->cost, stored->digest);
+  }
+
+  size_t file_count() const {
+    const std::filesystem::directory_iterator files(folder_.path);
+    return static_cast<size_t>(std::distance(begin(files), end(files)));
+  }
+
+  TemporaryDir folder_;
+  const std::string store_ = folder_.path + std::string("/credentials.db");
+  std::string said_;
+};
+
+TEST_F(Provision, TakesTheFirstLineOfInputAsItIs) {
+  const struct {
+    std::string input;
+    std::string password;
+  } cases[] = {{"1234\n", "1234"},
+               {"no end of line", "no end of line"},
+               {" blanks \r\nnext line\n", " blanks \r"},
+               {"caf\xc3\xa9\n", "caf\xc3\xa9"},
+               {std::string(1024, 'x') + "\n", std::string(1024, 'x')}};
+  for (const auto& [input, password] : cases) {
+    EXPECT_EQ(0, run({"--store", store_, "--status", "3", "--cost", "4"}, input)) << said_;
+    EXPECT_TRUE(has_password(3, password)) << input;
+    EXPECT_EQ("", said_);
+  }
+}
+
+TEST_F(Provision, ReplacesTheStoreWithAPrivateFileAndLeavesNoOther) {
+  ASSERT_EQ(0, run({"--store", store_, "--status=1", "--cost=4"}, "old\n"));
+  const mode_t mask = umask(0);
+  ASSERT_EQ(0, run({"--store", store_, "--status=2", "--cost=4"}, "new\n"));
+  umask(mask);
+  EXPECT_TRUE(has_password(2, "new"));
+  EXPECT_FALSE(has_password(2, "old"));
+  EXPECT_EQ(std::filesystem::perms(0600), std::filesystem::status(store_).permissions());
+  EXPECT_EQ(1u, file_count());
+}
+
+TEST_F(Provision, SaltsTheSamePasswordAnew) {
+  std::string error;
+  ASSERT_EQ(0, run({"--store", store_, "--status=1", "--cost=4"}, "1234\n"));
+  const std::optional<Credential> first = read_credential(store_, 0, error);
+  ASSERT_EQ(0, run({"--store", store_, "--status=1", "--cost=4"}, "1234\n"));
+  const std::optional<Credential> second = read_credential(store_, 0, error);
+  ASSERT_TRUE(first && second) << error;
+  EXPECT_NE(first->salt, second->salt);
+  EXPECT_NE(first->digest, second->digest);
+}
+
+TEST_F(Provision, StatusNoneReadsNoPassword) {
+  EXPECT_EQ(0, run({"--store", store_, "--status", "0"}, "")) << said_;
+  std::string error;
+  const std::optional<Credential> stored = read_credential(store_, 0, error);
+  ASSERT_TRUE(stored) << error;
+  EXPECT_EQ(kNoCredential, stored->status);
+}
+
+TEST_F(Provision, TakesThePathFromTheProperty) {
+  const TemporaryDir properties;
+  setenv("ANDROID_PROPERTY_DIR", properties.path, 1);
+  ASSERT_TRUE(android::base::SetProperty(kStorePathProperty, store_));
+  EXPECT_EQ(0, run({"--status", "5", "--cost", "4"}, "1234\n")) << said_;
+  unsetenv("ANDROID_PROPERTY_DIR");
+  EXPECT_TRUE(has_password(5, "1234"));
+}
+
+TEST_F(Provision, WrongUseIsExitStatusTwoAndLeavesTheStore) {
+  ASSERT_EQ(0, run({"--store", store_, "--status=1", "--cost=4"}, "kept\n"));
+  const struct {
+    std::vector<std::string> arguments;
+    std::string input;
+  } cases[] = {{{}, "1234\n"},
+               {{"--status"}, "1234\n"},
+               {{"--status", "6"}, "1234\n"},
+               {{"--status", "-1"}, "1234\n"},
+               {{"--status", "2x"}, "1234\n"},
+               {{"--status", "2", "--cost", "0"}, "1234\n"},
+               {{"--status", "2", "--cost", "17"}, "1234\n"},
+               {{"--status", "2", "1234"}, "1234\n"},
+               {{"--status", "2", "--bogus"}, "1234\n"},
+               {{"--status", "2"}, ""},
+               {{"--status", "2"}, "\nsecond line\n"},
+               {{"--status", "2"}, std::string("12\0", 3) + "34\n"},
+               {{"--status", "2"}, std::string(1025, 'x')}};
+  for (auto [arguments, input] : cases) {
+    arguments.insert(arguments.begin(), {"--store", store_});
+    EXPECT_EQ(2, run(arguments, input)) << testing::PrintToString(arguments);
+    EXPECT_NE("", said_);
+    EXPECT_EQ(std::string::npos, said_.find("xxxx")) << said_;
+  }
+  EXPECT_TRUE(has_password(1, "kept"));
+  EXPECT_EQ(1u, file_count());
+}
+
+TEST_F(Provision, StoreThatCannotBeMadeIsExitStatusOne) {
+  const std::string nowhere = folder_.path + std::string("/absent/credentials.db");
+  EXPECT_EQ(1, run({"--store", nowhere, "--status", "0"}, ""));
+  EXPECT_NE(std::string::npos, said_.find(nowhere + ": No such file or directory")) << said_;
+  ASSERT_EQ(0, mkdir(store_.c_str(), 0700));
+  EXPECT_EQ(1, run({"--store", store_, "--status", "0"}, ""));
+  EXPECT_EQ(1u, file_count()) << "the new file was left behind";
+}
+
+TEST_F(Provision, HelpNamesEveryOption) {
+  EXPECT_EQ(0, run({"--help"}, ""));
+  for (const char* option : {"--store", "--status", "--cost"}) {
+    EXPECT_NE(std::string::npos, said_.find(option)) << option;
+  }
+}
+
+}  // namespace
+}  // namespace sentrova

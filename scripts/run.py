@@ -1,0 +1,95 @@
+"""The command ./run: builds the virtual rescue device, boots it and runs a story on it."""
+
+from __future__ import annotations
+
+import argparse
+import signal
+import sys
+import time
+
+from device import vm
+from scripts import building
+
+DEFAULT_STORY = "ground_floor"
+STORY_TIMEOUT_SECONDS = 120
+
+
+def parse_arguments() -> argparse.Namespace:
+    parser = argparse.ArgumentParser(
+        prog="./run",
+        description="Builds the virtual rescue device (aarch64, emulated), boots it, and shows a "
+        "story on it step by step, with the time that each step took. On a Debian 12 machine it "
+        "installs the packages that are missing, for which it needs root or sudo.",
+        epilog="Exit status: 0 when the story went as it should, 1 when it did not, 2 for a wrong "
+        "command line.",
+    )
+    choice = parser.add_mutually_exclusive_group()
+    choice.add_argument("--list", action="store_true", help="list the stories")
+    choice.add_argument("--story", default=DEFAULT_STORY, help="the story to run (%(default)s)")
+    choice.add_argument(
+        "--shell",
+        action="store_true",
+        help="a shell on the device instead; `exit` powers it off, Ctrl-A X ends it at once",
+    )
+    return parser.parse_args()
+
+
+def list_stories() -> int:
+    for story in vm.stories():
+        print(f"{story.name:<16} {story.description}")
+    return 0
+
+
+def find_story(name: str) -> vm.Story:
+    for story in vm.stories():
+        if story.name == name:
+            return story
+    print(f"there is no story {name}; ./run --list shows them", file=sys.stderr)
+    sys.exit(2)
+
+
+def run_story(story: vm.Story) -> int:
+    print(f"\n{story.description}\n", flush=True)
+    with vm.Device() as device:
+        outcome = device.run_story(
+            story.path, STORY_TIMEOUT_SECONDS, lambda text: print(text, end="", flush=True)
+        )
+        device.keep_logs(building.BUILD / "logs" / story.name)
+    print()
+    if outcome.first_answer_seconds is not None:
+        print(f"from power-on to the first answered call: {outcome.first_answer_seconds:.1f} s")
+    print(f"from power-on to power-off: {outcome.seconds:.1f} s")
+    print(f"logs: build/logs/{story.name}")
+    if outcome.problem:
+        print(outcome.problem, file=sys.stderr)
+    return 0 if outcome.status == 0 else 1
+
+
+def run_shell() -> int:
+    print("\nthe device's console; `exit` powers it off\n", flush=True)
+    with vm.Device() as device:
+        return device.run_console()
+
+
+def main() -> int:
+    arguments = parse_arguments()
+    if arguments.list:
+        return list_stories()
+    story = find_story(arguments.story)
+    started = time.monotonic()
+    try:
+        building.install_packages("run")
+        with building.build_lock():
+            building.build_image()
+            building.build_preset("device", "initramfs")
+    except building.StepFailed as failure:
+        print(failure, file=sys.stderr)
+        return 1
+    print(f"ready after {time.monotonic() - started:.1f} s", flush=True)
+    return run_shell() if arguments.shell else run_story(story)
+
+
+if __name__ == "__main__":
+    # An ordinary end, so that the device is stopped and its folders are removed.
+    signal.signal(signal.SIGTERM, lambda *_: sys.exit(128 + signal.SIGTERM))
+    sys.exit(main())
