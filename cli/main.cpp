@@ -1,0 +1,42 @@
+#include <CLI/CLI.hpp>
+
+#include "cli/credential_commands.h"
+#include "cli/exit_status.h"
+#include "cli/output.h"
+
+namespace {
+
+constexpr char kDescription[] = "Asks the rescue service of this device about the owner's data.";
+constexpr char kExitStatusHelp[] =
+    "Exit status: 0 done, or yes; 1 no (the password is wrong); 2 the command line or the input\n"
+    "cannot be used; 3 the service was not reached or died; 4 the service could not do it.";
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  CLI::App app(kDescription, "sentrova");
+  app.footer(kExitStatusHelp);
+  app.require_subcommand(1);
+  app.fallthrough();
+  int user_id = 0;
+  bool json = false;
+  app.add_option("--user", user_id, "The user id (0 is the owner)")->capture_default_str();
+  app.add_flag("--json", json, "Print one JSON object instead of text");
+
+  const sentrova::Output output(json);
+  int status = sentrova::kExitSuccess;
+  app.add_subcommand("password-type", "Show what kind of credential locks the data")->callback([&] {
+    status = sentrova::show_password_type(user_id, output);
+  });
+  app.add_subcommand("verify",
+                     "Check a password: asked for without echo on a terminal, otherwise the first "
+                     "line of standard input")
+      ->callback([&] { status = sentrova::verify_password(user_id, output); });
+
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error) == 0 ? sentrova::kExitSuccess : sentrova::kExitUsage;
+  }
+  return status;
+}
