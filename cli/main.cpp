@@ -1,4 +1,6 @@
 #include <CLI/CLI.hpp>
+#include <cstdio>
+#include <exception>
 
 #include "cli/credential_commands.h"
 #include "cli/exit_status.h"
@@ -11,9 +13,7 @@ constexpr char kExitStatusHelp[] =
     "Exit status: 0 done, or yes; 1 no (the password is wrong); 2 the command line or the input\n"
     "cannot be used; 3 the service was not reached or died; 4 the service could not do it.";
 
-}  // namespace
-
-int main(int argc, char** argv) {
+int run(int argc, char** argv) {
   CLI::App app(kDescription, "sentrova");
   app.footer(kExitStatusHelp);
   app.require_subcommand(1);
@@ -39,4 +39,15 @@ int main(int argc, char** argv) {
     return app.exit(error) == 0 ? sentrova::kExitSuccess : sentrova::kExitUsage;
   }
   return status;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  try {
+    return run(argc, argv);
+  } catch (const std::exception& error) {
+    fprintf(stderr, "sentrova: %s\n", error.what());
+    return sentrova::kExitServiceFailed;
+  }
 }

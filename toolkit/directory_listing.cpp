@@ -1,0 +1,32 @@
+#include "toolkit/directory_listing.h"
+
+#include <dirent.h>
+
+#include <memory>
+#include <string_view>
+
+namespace sentrova::toolkit {
+namespace {
+
+struct DirectoryCloser {
+  void operator()(DIR* directory) const { closedir(directory); }
+};
+
+}  // namespace
+
+std::optional<std::vector<DirectoryEntry>> list_directory(const std::string& directory) {
+  const std::unique_ptr<DIR, DirectoryCloser> stream(opendir(directory.c_str()));
+  if (stream == nullptr) {
+    return std::nullopt;
+  }
+  std::vector<DirectoryEntry> entries;
+  while (const dirent* entry = readdir(stream.get())) {
+    const std::string_view name = entry->d_name;
+    if (name != "." && name != "..") {
+      entries.push_back({std::string(name), entry->d_type});
+    }
+  }
+  return entries;
+}
+
+}  // namespace sentrova::toolkit
