@@ -35,8 +35,16 @@ int run(int argc, char** argv) {
 
   try {
     app.parse(argc, argv);
+  } catch (const CLI::ExtrasError&) {
+    // What was given is not repeated: it may be a password.
+    output.error("an argument was not expected; passwords are never taken from the command line");
+    return sentrova::kExitUsage;
   } catch (const CLI::ParseError& error) {
-    return app.exit(error) == 0 ? sentrova::kExitSuccess : sentrova::kExitUsage;
+    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::Success)) {
+      return app.exit(error);  // help
+    }
+    output.error(error.what());
+    return sentrova::kExitUsage;
   }
   return status;
 }
@@ -45,7 +53,12 @@ int run(int argc, char** argv) {
 
 int main(int argc, char** argv) {
   try {
-    return run(argc, argv);
+    const int status = run(argc, argv);
+    if (fflush(stdout) != 0 || ferror(stdout) != 0) {
+      fprintf(stderr, "sentrova: the answer could not be written\n");
+      return sentrova::kExitServiceFailed;
+    }
+    return status;
   } catch (const std::exception& error) {
     fprintf(stderr, "sentrova: %s\n", error.what());
     return sentrova::kExitServiceFailed;

@@ -47,7 +47,6 @@ PasswordInput checked(std::string& password) {
     error = "the password is not UTF-8 text";
   }
   if (!error.empty()) {
-    wipe(password);
     return failure(std::move(error));
   }
   return {.password = std::move(password), .error = ""};
@@ -56,12 +55,14 @@ PasswordInput checked(std::string& password) {
 PasswordInput ask_on_terminal(const char* prompt) {
   std::array<char, 4096> line;
   if (readpassphrase(prompt, line.data(), line.size(), RPP_ECHO_OFF | RPP_STDIN) == nullptr) {
-    return failure(std::string("cannot read the password: ") + strerror(errno));
+    const int error = errno;
+    explicit_bzero(line.data(), line.size());
+    return failure(std::string("cannot read the password: ") + strerror(error));
   }
   std::string password(line.data());
+  const WipeOnExit wipe_password(password);
   explicit_bzero(line.data(), line.size());
   if (password.size() + 1 == line.size()) {
-    wipe(password);
     return failure("the password is too long to be typed; give it on standard input");
   }
   return checked(password);

@@ -6,9 +6,10 @@
 
 namespace sentrova {
 
-// Overwrites the characters of a secret with zeros in a way that the compiler keeps, and empties
-// it.
+// Overwrites the room of a secret with zeros in a way that the compiler keeps, and empties it. All
+// of the room: a string that was moved from is empty, and a short one still holds its characters.
 inline void wipe(std::string& secret) {
+  secret.resize(secret.capacity());
   explicit_bzero(secret.data(), secret.size());
   secret.clear();
 }

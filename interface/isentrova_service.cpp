@@ -3,6 +3,9 @@
 #include <binder/Parcel.h>
 #include <utils/Errors.h>
 #include <utils/String16.h>
+#include <utils/String8.h>
+
+#include <string_view>
 
 #include "common/wipe.h"
 #include "common/wipe_utils_strings.h"
@@ -30,18 +33,18 @@ class Request {
   }
 
   // The parcel that carries the password is cleared when it is done with, here and in the receiver.
-  // Text that is not UTF-8 would become an empty password and is refused.
+  // Text that is not UTF-8 would become another password, and is refused: the conversion passes
+  // over what it does not understand, so its result is converted back and compared.
   Request& password(const std::string& password) {
     if (status_ != NO_ERROR) {
       return *this;
     }
     data_.markSensitive();
     const String16 utf16(password.data(), password.size());
-    if (utf16.size() == 0 && !password.empty()) {
-      status_ = BAD_VALUE;
-      return *this;
-    }
-    status_ = data_.writeString16(utf16);
+    const String8 back(utf16);
+    const bool same = std::string_view(back.string(), back.size()) == password;
+    status_ = same ? data_.writeString16(utf16) : BAD_VALUE;
+    sentrova::wipe(back);
     sentrova::wipe(utf16);
     return *this;
   }

@@ -224,7 +224,13 @@ TEST_F(TransactionDispatch, TheProxyWritesWhatTheServiceReads) {
   EXPECT_TRUE(service_->flag_);
 
   service_->operation_ = "";
-  EXPECT_EQ(proxy->verifyUserPassWord(0, "not UTF-8: \xff"), android::BAD_VALUE);
+  for (const char* text : {"not UTF-8: \xff", "\xffxyz", "\xc1\xa1",
+                           "\x80"
+                           "abc",
+                           "a\xed\xa0\x80"
+                           "b"}) {
+    EXPECT_EQ(proxy->verifyUserPassWord(0, text), android::BAD_VALUE) << text;
+  }
   EXPECT_EQ(service_->operation_, "");
   relay->status_ = android::DEAD_OBJECT;
   EXPECT_EQ(proxy->fbeDecryptMetadata(), android::DEAD_OBJECT);

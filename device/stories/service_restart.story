@@ -22,6 +22,15 @@ check "the service manager stops" wait_for 5 service_is servicemanager stopped
 step_with_input "Asking without a service manager" "$password" sentrova verify
 expect_status 3
 
+step "The service manager is started again" setprop ctl.start servicemanager
+step_with_input "The right password: the service is registered anew" "$password" sentrova verify
+expect_status 0
+expect_output "the password is right"
+
+step "A password given as an argument is not repeated" sentrova verify open-sesame
+expect_status 2
+expect_equal "the password in the message" "" "$(echo "$output" | grep open-sesame)"
+
 step "A service that does not exist" setprop ctl.start nobody
 sleep 0.2
 expect_equal "its state" "" "$(getprop init.svc.nobody)"

@@ -25,12 +25,13 @@ bool is_acceptable_cost(const ScryptCost& cost) {
 
 std::optional<Digest> derive_digest(std::string_view password, const Salt& salt,
                                     const ScryptCost& cost) {
-  Digest digest = {};
+  std::optional<Digest> digest(std::in_place);  // returned as it lies, so that no copy stays
   if (password.find('\0') != std::string_view::npos || !is_acceptable_cost(cost) ||
       EVP_PBE_scrypt(password.data(), password.size(), salt.data(), salt.size(),
                      uint64_t{1} << cost.log2_n, static_cast<uint64_t>(cost.r),
-                     static_cast<uint64_t>(cost.p), kMaxScryptMemoryBytes, digest.data(),
-                     digest.size()) != 1) {
+                     static_cast<uint64_t>(cost.p), kMaxScryptMemoryBytes, digest->data(),
+                     digest->size()) != 1) {
+    OPENSSL_cleanse(digest->data(), digest->size());
     return std::nullopt;
   }
   return digest;

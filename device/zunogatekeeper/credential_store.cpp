@@ -136,13 +136,15 @@ class StoreReader {
   }
 
   static bool take_integer(sqlite3_stmt* row, int column, int64_t& value) {
+    const bool is_integer = sqlite3_column_type(row, column) == SQLITE_INTEGER;
     value = sqlite3_column_int64(row, column);
-    return sqlite3_column_type(row, column) == SQLITE_INTEGER;
+    return is_integer;
   }
 
   static bool take_blob(sqlite3_stmt* row, int column, uint8_t* bytes, size_t size) {
+    const bool is_blob = sqlite3_column_type(row, column) == SQLITE_BLOB;
     const void* const blob = sqlite3_column_blob(row, column);
-    if (sqlite3_column_type(row, column) != SQLITE_BLOB || blob == nullptr ||
+    if (!is_blob || blob == nullptr ||
         sqlite3_column_bytes(row, column) != static_cast<int>(size)) {
       return false;
     }

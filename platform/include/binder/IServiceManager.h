@@ -30,9 +30,8 @@ class SENTROVA_API IServiceManager : public IInterface {
   virtual sp<IBinder> checkService(const String16& name) const = 0;
 
   // Enters `service`, instead of one of that name that is there. OK; PERMISSION_DENIED unless the
-  // caller is root or the system user (1000); BAD_VALUE for a bad name or no service; NO_MEMORY
-  // when the directory is full; DEAD_OBJECT when the service has died; or a failure of the call
-  // itself.
+  // caller is root or the system user (1000); BAD_VALUE for a bad name, no service or a
+  // dead one; NO_MEMORY when the directory is full; or a failure of the call itself.
   virtual status_t addService(const String16& name, const sp<IBinder>& service,
                               bool allow_isolated = false,
                               int dump_flags = DUMP_FLAG_PRIORITY_DEFAULT) = 0;

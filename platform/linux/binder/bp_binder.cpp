@@ -44,7 +44,8 @@ const String16& BpBinder::getInterfaceDescriptor() const {
     descriptor_ = answer;
     descriptor_known_ = true;
   }
-  return descriptor_;
+  static const String16 unknown;
+  return descriptor_known_ ? descriptor_ : unknown;
 }
 
 bool BpBinder::isBinderAlive() const {

@@ -85,7 +85,9 @@ status_t IPCThreadState::take_reply(Parcel* reply) {
     return status;
   int32_t answer;
   const status_t read_status = taker->readInt32(&answer);
-  return read_status == OK ? answer : read_status;
+  if (read_status != OK)
+    return read_status;
+  return answer > 0 ? UNKNOWN_ERROR : answer;  // statuses are negative
 }
 
 status_t IPCThreadState::execute(uint32_t command) {

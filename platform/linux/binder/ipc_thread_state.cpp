@@ -18,6 +18,7 @@ using sentrova::binder::Driver;
 
 // How often in a row the driver may fail before a serving thread gives it up.
 constexpr int kMostFailuresInARow = 10;
+constexpr useconds_t kFirstPauseMicroseconds = 500;  // doubled with every failure
 
 thread_local IPCThreadState* of_this_thread = nullptr;
 thread_local bool thread_is_ending = false;
@@ -211,6 +212,8 @@ void IPCThreadState::joinThreadPool(bool is_main) {
     if (status == OK)
       status = execute(command);
     failures = status == OK ? 0 : failures + 1;
+    if (failures > 0)
+      usleep(kFirstPauseMicroseconds << failures);  // the driver may lack memory for a moment
   }
   is_looper_ = false;
   if (failures == kMostFailuresInARow)

@@ -12,10 +12,13 @@
 #include <vector>
 
 #include "binder/Binder.h"
-#include "platform/linux/binder/allocation_count.h"
+#include "tests/support/allocation_count.h"
 
 namespace android {
 namespace {
+
+using sentrova::AllocationCount;
+using sentrova::FreedBlock;
 
 using base::unique_fd;
 

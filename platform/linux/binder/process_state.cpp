@@ -15,12 +15,12 @@
 namespace android {
 namespace {
 
+using sentrova::binder::kContextManagerHandle;
 using sentrova::binder::Driver;
 using sentrova::binder::ProcessContext;
 
 constexpr const char* kDefaultDriver = "/dev/binder";
 constexpr uint32_t kDefaultMaxThreads = 15;
-constexpr int32_t kContextManagerHandle = 0;
 
 // The process's connection. Never destroyed: threads of the pool use it until the very end.
 struct Connection {

@@ -34,6 +34,15 @@ int ProxyTable::acquire(int32_t handle) {
   return write(commands.data(), commands.size());
 }
 
+void ProxyTable::give_back(int32_t handle, const Entry& entry) {
+  CommandWriter commands;
+  if (entry.death_cookie != 0)
+    commands.put(BC_CLEAR_DEATH_NOTIFICATION, handle, entry.death_cookie);
+  commands.put(BC_RELEASE, handle);
+  commands.put(BC_DECREFS, handle);
+  write(commands.data(), commands.size());
+}
+
 int ProxyTable::write_death_command(uint32_t command, int32_t handle, uint64_t cookie) {
   CommandWriter commands;
   commands.put(command, handle, cookie);
@@ -43,15 +52,23 @@ int ProxyTable::write_death_command(uint32_t command, int32_t handle, uint64_t c
 sp<BpBinder> ProxyTable::find_or_make(int32_t handle) {
   if (driver_ == nullptr)
     return nullptr;
+  sp<BpBinder> former;  // let go of without the lock, which its release takes
   const std::lock_guard guard(lock_);
-  const auto found = entries_.find(handle);
+  auto found = entries_.find(handle);
   if (found != entries_.end()) {
-    sp<BpBinder> proxy = found->second.proxy.promote();
-    if (proxy != nullptr)
-      return proxy;
-  } else if (acquire(handle) != 0) {
-    return nullptr;
+    former = found->second.proxy.promote();
+    const bool dead_manager = handle == kContextManagerHandle &&
+                              (former == nullptr ? found->second.dead : !former->isBinderAlive());
+    if (former != nullptr && !dead_manager)
+      return former;
+    if (dead_manager) {
+      give_back(handle, found->second);
+      entries_.erase(found);
+      found = entries_.end();
+    }
   }
+  if (found == entries_.end() && acquire(handle) != 0)
+    return nullptr;
   const bool dead = found != entries_.end() && found->second.dead;
   const sp<BpBinder> proxy = new BpBinder(handle, !dead);
   Entry& entry = entries_[handle];
@@ -67,14 +84,8 @@ void ProxyTable::release(int32_t handle, const BpBinder* proxy) {
   const auto found = entries_.find(handle);
   if (found == entries_.end() || found->second.identity != proxy)
     return;
-  const uint64_t cookie = found->second.death_cookie;
+  give_back(handle, found->second);
   entries_.erase(found);
-  CommandWriter commands;
-  if (cookie != 0)
-    commands.put(BC_CLEAR_DEATH_NOTIFICATION, handle, cookie);
-  commands.put(BC_RELEASE, handle);
-  commands.put(BC_DECREFS, handle);
-  write(commands.data(), commands.size());
 }
 
 status_t ProxyTable::request_death(int32_t handle) {

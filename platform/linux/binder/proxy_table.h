@@ -14,6 +14,9 @@ namespace sentrova::binder {
 
 class Driver;
 
+// The handle of the context manager, whichever process is it (linux/android/binder.h).
+inline constexpr int32_t kContextManagerHandle = 0;
+
 // The proxies of a process, one for each handle, and what the driver counts for them: one strong
 // and one weak reference, and at most one death notification, for each handle in the table.
 //
@@ -25,7 +28,9 @@ class SENTROVA_API ProxyTable {
   // `driver` may be null, in which case there are no proxies; it must outlive the table.
   explicit ProxyTable(Driver* driver) : driver_(driver) {}
 
-  // The proxy of `handle`. Null without a driver or when it refuses the references.
+  // The proxy of `handle`. Null without a driver or when it refuses the references. A dead context
+  // manager's proxy is not handed out again: its handle is its successor's, and so are new
+  // references.
   android::sp<android::BpBinder> find_or_make(int32_t handle);
 
   // Gives the handle back to the driver, if `proxy`, which is about to be destroyed and is not
@@ -54,6 +59,7 @@ class SENTROVA_API ProxyTable {
 
   int write(const void* commands, size_t size);
   int acquire(int32_t handle);
+  void give_back(int32_t handle, const Entry& entry);
   int write_death_command(uint32_t command, int32_t handle, uint64_t cookie);
 
   std::atomic<Driver*> driver_;

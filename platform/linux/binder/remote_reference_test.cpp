@@ -192,6 +192,19 @@ TEST_F(RemoteReferences, ALostCallMarksTheObjectDeadForGood) {
   EXPECT_EQ(DEAD_OBJECT, object->linkToDeath(new Recipient()));
 }
 
+// The handle of a context manager that died is its successor's, also while the old proxy is held.
+TEST_F(RemoteReferences, ADeadManagersProxyIsNotHandedOutAgain) {
+  const sp<IBinder> first = ProcessState::self()->getStrongProxyForHandle(0);
+  ASSERT_NE(nullptr, first);
+  kernel_.add_step(FakeDriver::returned(BR_NOOP) + FakeDriver::returned(BR_DEAD_REPLY));
+  EXPECT_EQ(DEAD_OBJECT, first->pingBinder());
+  const sp<IBinder> second = ProcessState::self()->getStrongProxyForHandle(0);
+  ASSERT_NE(nullptr, second);
+  EXPECT_NE(first, second);
+  EXPECT_TRUE(second->isBinderAlive());
+  EXPECT_EQ(second, ProcessState::self()->getStrongProxyForHandle(0));
+}
+
 TEST_F(RemoteReferences, SurviveTheRaceOfLastReleaseAndNewLookUp) {
   constexpr int kThreads = 4;
   constexpr int kRounds = 2000;

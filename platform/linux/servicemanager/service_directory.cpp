@@ -81,7 +81,7 @@ status_t ServiceDirectory::addService(const String16& name, const sp<IBinder>& s
     // An object of this process cannot die and cannot be watched.
     const status_t status = service->linkToDeath(watcher);
     if (status != android::OK && status != android::INVALID_OPERATION)
-      return status;
+      return android::BAD_VALUE;
     std::swap(entries_[name], entry);
   }
   if (entry.service != nullptr)

@@ -148,7 +148,7 @@ TEST_F(ServiceDirectoryTest, ForgetsTheDeadButNotTheirSuccessors) {
   }
   EXPECT_EQ(second, directory_->checkService(name));
   EXPECT_EQ(nullptr, directory_->checkService(String16("other")));
-  EXPECT_EQ(android::DEAD_OBJECT, add(name, first)) << "a dead service is not entered";
+  EXPECT_EQ(android::BAD_VALUE, add(name, first)) << "a dead service is not entered";
   EXPECT_EQ(second, directory_->checkService(name));
   second->die();
   EXPECT_EQ(0U, directory_->listServices(0).size());

@@ -1,4 +1,4 @@
-#include "platform/linux/binder/allocation_count.h"
+#include "tests/support/allocation_count.h"
 
 #include <malloc.h>
 #include <string.h>
@@ -13,7 +13,7 @@
 #define UNDER_ADDRESS_SANITIZER 1
 #endif
 
-namespace android {
+namespace sentrova {
 namespace {
 
 thread_local size_t blocks_taken = 0;
@@ -55,7 +55,7 @@ FreedBlock::State FreedBlock::state() const {
   return watched_state;
 }
 
-}  // namespace android
+}  // namespace sentrova
 
 #ifdef UNDER_ADDRESS_SANITIZER
 
@@ -63,8 +63,8 @@ FreedBlock::State FreedBlock::state() const {
 
 namespace {
 [[maybe_unused]] const int hooks_installed = __sanitizer_install_malloc_and_free_hooks(
-    [](const volatile void*, size_t) { android::note_taken(); },
-    [](const volatile void* block) { android::note_freed(block); });
+    [](const volatile void*, size_t) { sentrova::note_taken(); },
+    [](const volatile void* block) { sentrova::note_freed(block); });
 }  // namespace
 
 #else
@@ -77,22 +77,22 @@ void* __libc_realloc(void* block, size_t size);
 void __libc_free(void* block);
 
 void* malloc(size_t size) {
-  android::note_taken();
+  sentrova::note_taken();
   return __libc_malloc(size);
 }
 
 void* calloc(size_t count, size_t size) {
-  android::note_taken();
+  sentrova::note_taken();
   return __libc_calloc(count, size);
 }
 
 void* realloc(void* block, size_t size) {
-  android::note_taken();
+  sentrova::note_taken();
   return __libc_realloc(block, size);
 }
 
 void free(void* block) {
-  android::note_freed(block);
+  sentrova::note_freed(block);
   __libc_free(block);
 }
 }

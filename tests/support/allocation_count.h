@@ -3,7 +3,7 @@
 #include <stddef.h>
 #include <stdint.h>
 
-namespace android {
+namespace sentrova {
 
 // Counts the blocks that the calling thread takes from the heap while this object lives. For tests.
 class AllocationCount {
@@ -25,4 +25,4 @@ class FreedBlock {
   State state() const;
 };
 
-}  // namespace android
+}  // namespace sentrova
