@@ -1,5 +1,6 @@
 // What a loading program links against: the tables of the service in the built library.
 
+#include <android-base/strings.h>
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 
@@ -79,23 +80,11 @@ TEST(ServiceTables, BinderPartKeepsThePlatformsOrder) {
   while (name_of(*slot).find("queryLocalInterface") == std::string::npos) {
     ++slot;
   }
-  const std::vector<std::string> expected = {"queryLocalInterface",
-                                             "getInterfaceDescriptor",
-                                             "isBinderAlive",
-                                             "pingBinder",
-                                             "dump",
-                                             "transact",
-                                             "linkToDeath",
-                                             "unlinkToDeath",
-                                             "checkSubclass",
-                                             "attachObject",
-                                             "findObject",
-                                             "detachObject",
-                                             "localBinder",
-                                             "remoteBinder",
-                                             "D1Ev",
-                                             "D0Ev",
-                                             "onTransact"};
+  const std::string names =
+      "queryLocalInterface getInterfaceDescriptor isBinderAlive pingBinder dump transact "
+      "linkToDeath unlinkToDeath checkSubclass attachObject findObject detachObject localBinder "
+      "remoteBinder D1Ev D0Ev onTransact";
+  const std::vector<std::string> expected = android::base::Split(names, " ");
   for (size_t i = 0; i < expected.size(); ++i) {
     EXPECT_NE(name_of(slot[i]).find(expected[i]), std::string::npos)
         << "slot " << i << " is " << name_of(slot[i]);

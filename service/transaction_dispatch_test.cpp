@@ -101,23 +101,16 @@ TEST_F(TransactionDispatch, OtherCodesGoToTheBinderBase) {
     EXPECT_EQ(transact(code), android::UNKNOWN_TRANSACTION) << code;
   }
   EXPECT_EQ(reply_.dataSize(), 0u);
-  EXPECT_EQ(transact(android::IBinder::INTERFACE_TRANSACTION), android::NO_ERROR);
-  reply_.setDataPosition(0);
-  EXPECT_EQ(reply_.readString16(), ISentrovaService::descriptor);
   EXPECT_EQ(service_->operation_, "");
 }
 
-TEST_F(TransactionDispatch, WithoutTheTokenNothingIsCalledAndTheReplyStaysAsItWas) {
-  Parcel no_token;
-  no_token.writeInt32(3);
-  Parcel wrong_token;
-  wrong_token.writeInterfaceToken(String16("android.ISomethingElse"));
-  wrong_token.writeInt32(3);
-  for (const Parcel* data : {&no_token, &wrong_token}) {
-    for (const Operation& operation : kOperations) {
-      data->setDataPosition(0);
-      EXPECT_EQ(service_->onTransact(operation.code, *data, &reply_, 0), -1) << operation.name;
-    }
+TEST_F(TransactionDispatch, WithAWrongTokenNothingIsCalledAndTheReplyStaysAsItWas) {
+  Parcel data;
+  data.writeInterfaceToken(String16("android.ISomethingElse"));
+  data.writeInt32(3);
+  for (const Operation& operation : kOperations) {
+    data.setDataPosition(0);
+    EXPECT_EQ(service_->onTransact(operation.code, data, &reply_, 0), -1) << operation.name;
   }
   EXPECT_EQ(service_->operation_, "");
   EXPECT_EQ(reply_.dataSize(), 0u);
@@ -159,37 +152,23 @@ TEST_F(TransactionDispatch, PasswordsOfAnyContent) {
       {String16(with_nul, 4), "ab"},
       {String16(lone_surrogates, 4), "ab"},  // the platform's conversion leaves them out
       {String16("\xf0\x9f\x94\x91 key"), "\xf0\x9f\x94\x91 key"},
-      {String16(), ""},
       {String16(big.data(), big.size()), big}};
+  const size_t head = data_.dataSize();
   for (const auto& [sent, received] : table) {
-    Parcel data;
-    data.writeInterfaceToken(ISentrovaService::descriptor);
-    data.writeInt32(0);
-    ASSERT_EQ(data.writeString16(sent), android::NO_ERROR);
-    data.setDataPosition(0);
-    EXPECT_EQ(service_->onTransact(2, data, &reply_, 0), android::NO_ERROR);
+    data_.setDataSize(head);
+    data_.writeInt32(0);
+    data_.writeString16(sent);
+    EXPECT_EQ(transact(2), android::NO_ERROR);
     EXPECT_EQ(service_->password_, received);
   }
-}
-
-TEST_F(TransactionDispatch, AbsurdStringLengthsGiveAnEmptyPassword) {
-  for (const int32_t length : {-1, -2, INT32_MIN, 3, 0x3fffffff, 0x7ffffffe, INT32_MAX}) {
-    Parcel data;
-    data.writeInterfaceToken(ISentrovaService::descriptor);
-    data.writeInt32(1);
-    data.writeInt32(length);
-    data.writeInt32(0x00610061);
-    data.setDataPosition(0);
-    EXPECT_EQ(service_->onTransact(2, data, &reply_, 0), android::NO_ERROR) << length;
+  for (const int32_t length : {-1, -2, INT32_MIN, 3, 0x7ffffffe, INT32_MAX}) {
+    data_.setDataSize(head);
+    data_.writeInt32(1);
+    data_.writeInt32(length);
+    data_.writeInt32(0x00610061);
+    EXPECT_EQ(transact(2), android::NO_ERROR) << length;
     EXPECT_EQ(service_->password_, "") << length;
   }
-}
-
-TEST_F(TransactionDispatch, TheObjectIsFoundUnderItsDescriptorOnly) {
-  EXPECT_EQ(service_->queryLocalInterface(ISentrovaService::descriptor).get(), service_.get());
-  EXPECT_EQ(service_->queryLocalInterface(String16("android.ISentrovaServic")), nullptr);
-  EXPECT_EQ(service_->queryLocalInterface(String16()), nullptr);
-  EXPECT_EQ(ISentrovaService::asInterface(service_).get(), service_.get());
 }
 
 // The same binder reached as a remote one would be: through a proxy and its parcels.
@@ -208,27 +187,22 @@ TEST_F(TransactionDispatch, TheProxyWritesWhatTheServiceReads) {
   const sp<ISentrovaService> proxy = ISentrovaService::asInterface(relay);
   ASSERT_NE(proxy, nullptr);
   ASSERT_NE(proxy.get(), service_.get());
-
-  EXPECT_EQ(proxy->getUserPassWordType(1), 7);
-  EXPECT_EQ(service_->operation_, "type");
-  EXPECT_EQ(proxy->verifyUserPassWord(2, "pass wörd"), 7);
+  const auto expect_called = [this](int32_t result, const char* operation, int32_t user_id) {
+    EXPECT_EQ(result, 7);
+    EXPECT_EQ(service_->operation_, operation);
+    EXPECT_EQ(service_->user_id_, user_id);
+  };
+  expect_called(proxy->getUserPassWordType(1), "type", 1);
+  expect_called(proxy->verifyUserPassWord(2, "pass wörd"), "verify", 2);
   EXPECT_EQ(service_->password_, "pass wörd");
-  EXPECT_EQ(proxy->fdeDecryptUser(3), 7);
-  EXPECT_EQ(service_->operation_, "fde");
-  EXPECT_EQ(proxy->fbeDecryptMetadata(), 7);
-  EXPECT_EQ(service_->operation_, "metadata");
-  EXPECT_EQ(proxy->fbeDecryptUserDe(5), 7);
-  EXPECT_EQ(service_->user_id_, 5);
-  EXPECT_EQ(proxy->fbeDecryptUserCe(6, "x", true), 7);
-  EXPECT_EQ(service_->operation_, "ce");
+  expect_called(proxy->fdeDecryptUser(3), "fde", 3);
+  expect_called(proxy->fbeDecryptMetadata(), "metadata", 0);
+  expect_called(proxy->fbeDecryptUserDe(5), "de", 5);
+  expect_called(proxy->fbeDecryptUserCe(6, "x", true), "ce", 6);
   EXPECT_TRUE(service_->flag_);
 
   service_->operation_ = "";
-  for (const char* text : {"not UTF-8: \xff", "\xffxyz", "\xc1\xa1",
-                           "\x80"
-                           "abc",
-                           "a\xed\xa0\x80"
-                           "b"}) {
+  for (const char* text : {"not UTF-8: \xff", "\xc1\xa1", "\xed\xa0\x80"}) {
     EXPECT_EQ(proxy->verifyUserPassWord(0, text), android::BAD_VALUE) << text;
   }
   EXPECT_EQ(service_->operation_, "");

@@ -2,7 +2,6 @@
 
 #include <android-base/file.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 
 #include <cstddef>
@@ -63,23 +62,6 @@ class ScratchTest : public ::testing::Test {
 
   const std::ptrdiff_t descriptors_before_;
   TemporaryDir directory_;
-};
-
-// Lets the process have few descriptors open at a time, so that a walk cannot hold one a level.
-class FewDescriptors {
- public:
-  FewDescriptors() {
-    getrlimit(RLIMIT_NOFILE, &limit_);
-    constexpr rlim_t kFew = 24;
-    const rlimit few = {kFew, limit_.rlim_max};
-    setrlimit(RLIMIT_NOFILE, &few);
-  }
-  ~FewDescriptors() { setrlimit(RLIMIT_NOFILE, &limit_); }
-  FewDescriptors(const FewDescriptors&) = delete;
-  FewDescriptors& operator=(const FewDescriptors&) = delete;
-
- private:
-  rlimit limit_;
 };
 
 // Names that a file system takes and careless code trips over.

@@ -50,7 +50,7 @@ class SENTROVA_API ZunoFunc {
   // that is still running then is killed and given five more seconds to disappear. `cmd` is a label
   // for messages. Returns 0 if the child exited in time, with whatever code, or is no child (any
   // longer); -1 if it was killed, by this function or otherwise, or the wait failed. With -1 as
-  // `pid` any child counts, and none is killed.
+  // `pid` any child counts, and with 0 any of the own process group; then none is killed.
   static int Wait_For_Child_Timeout(pid_t pid, int* status, const std::string& cmd,
                                     int timeout_seconds);
 

@@ -3,13 +3,17 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
+
 #include "toolkit/log_tag.h"
 #include "toolkit/shell.h"
+#include "toolkit/whole_sleep.h"
 #include "toolkit/zuno_func.h"
 
 using sentrova::toolkit::kLogTag;
 using sentrova::toolkit::kShellArgumentZero;
 using sentrova::toolkit::kShellPath;
+using sentrova::toolkit::sleep_whole;
 
 namespace {
 
@@ -17,6 +21,7 @@ constexpr unsigned int kPollSeconds = 1;
 constexpr int kKillRounds = 5;
 constexpr size_t kPieceBytes = 127;
 constexpr pid_t kAnyChild = -1;
+constexpr pid_t kOwnGroup = 0;
 
 // As getc, but a read that a signal handler interrupted is taken up again, so that nothing of what
 // the stream has read so far is lost.
@@ -62,15 +67,20 @@ int report_signal(const std::string& cmd, int status) {
   return -1;
 }
 
+void sleep_one_poll() {
+  sleep_whole(std::chrono::seconds(kPollSeconds), [] { sleep(kPollSeconds); });
+}
+
 void kill_child(pid_t pid, int* status, const std::string& cmd) {
   fprintf(stdout, "[%s]I: %s took too long, killing process\n", kLogTag, cmd.c_str());
-  // The id -1 of a failed fork would make the kernel kill every process of the device.
-  if (pid != kAnyChild) {
+  // The id -1 of a failed fork would make the kernel kill every process of the device, and 0 the
+  // caller's own group.
+  if (pid != kAnyChild && pid != kOwnGroup) {
     kill(pid, SIGKILL);
   }
   pid_t reaped = 0;
   for (int round = 0; round < kKillRounds && reaped == 0; ++round) {
-    sleep(kPollSeconds);
+    sleep_one_poll();
     reaped = waitpid(pid, status, WNOHANG);
   }
   if (reaped != 0) {
@@ -156,7 +166,7 @@ int ZunoFunc::Wait_For_Child_Timeout(pid_t pid, int* status, const std::string& 
                                      int timeout_seconds) {
   pid_t reaped = waitpid(pid, status, WNOHANG);
   for (int remaining = timeout_seconds; remaining != 0 && reaped == 0;) {
-    sleep(kPollSeconds);
+    sleep_one_poll();
     reaped = waitpid(pid, status, WNOHANG);
     if (remaining > 0) {
       --remaining;

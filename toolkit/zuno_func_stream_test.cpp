@@ -13,14 +13,12 @@
 
 #include "tests/support/private_mounts.h"
 #include "tests/support/process_limits.h"
-#include "tests/support/signals.h"
 #include "toolkit/zuno_func.h"
 
 namespace {
 
 using sentrova::testing::forbid_new_descriptors;
 using sentrova::testing::forbid_new_processes;
-using sentrova::testing::RepeatedInterruption;
 using ::testing::ExitedWithCode;
 
 // Lists the shell's descriptors, one a line.
@@ -72,13 +70,6 @@ class PipeStreams : public ::testing::Test {
   }
 };
 
-TEST_F(PipeStreams, ReadOutputAndReturnTheRawStatus) {
-  FILE* stream = __popen("echo $0 text; exit 7", "r");
-  ASSERT_NE(stream, nullptr);
-  EXPECT_EQ(read_all(stream), "sh text\n");
-  EXPECT_EQ(__pclose(stream), 7 << 8);
-}
-
 TEST_F(PipeStreams, WriteInputAndWaitForItsUse) {
   const TemporaryFile file;
   FILE* stream = __popen(("cat >" + std::string(file.path) + "; kill -15 $$").c_str(), "w");
@@ -118,30 +109,6 @@ TEST_F(PipeStreams, MayBeClosedInAnyOrder) {
     EXPECT_EQ(__pclose(streams[index]), static_cast<int>(index) << 8);
   }
   EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
-}
-
-TEST_F(PipeStreams, WaitThroughInterruptions) {
-  const RepeatedInterruption interruption;
-  FILE* stream = __popen("exec >&-; sleep 0.3; exit 2", "r");
-  ASSERT_NE(stream, nullptr);
-  EXPECT_EQ(__pclose(stream), 2 << 8);
-}
-
-TEST_F(PipeStreams, ReturnMinusOneWhenSomebodyElseReapedTheChild) {
-  FILE* stream = __popen("exit 2", "r");
-  ASSERT_NE(stream, nullptr);
-  EXPECT_GT(waitpid(-1, nullptr, 0), 0);
-  EXPECT_EQ(__pclose(stream), -1);
-}
-
-TEST_F(PipeStreams, ReachNoOtherChild) {
-  const int usual = usual_pipes();
-  FILE* input = __popen("cat >/dev/null", "w");
-  FILE* listing = __popen(kListDescriptors, "r");
-  ASSERT_TRUE(input != nullptr && listing != nullptr);
-  EXPECT_EQ(count_pipes(listing), usual);
-  EXPECT_EQ(__pclose(listing), 0);
-  EXPECT_EQ(__pclose(input), 0);
 }
 
 TEST_F(PipeStreams, OpenedByTwoThreadsAtOnceReachNoOtherChild) {

@@ -11,9 +11,11 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
 
 #include "toolkit/log_tag.h"
+#include "toolkit/whole_sleep.h"
 #include "toolkit/zuno_func.h"
 
 using android::base::GetProperty;
@@ -42,7 +44,8 @@ template <typename Condition>
 bool poll_until(Condition condition, double timeout_seconds) {
   for (int64_t left = poll_count(timeout_seconds); left > 0; --left) {
     // Before the first look too: a request made just now is given time to take effect.
-    usleep(kPollMicroseconds);
+    sentrova::toolkit::sleep_whole(std::chrono::microseconds(kPollMicroseconds),
+                                   [] { usleep(kPollMicroseconds); });
     if (condition()) {
       return true;
     }

@@ -1,13 +1,15 @@
+#include <android-base/file.h>
+#include <android-base/unique_fd.h>
 #include <string.h>
 #include <sys/random.h>
 
 #include <algorithm>
-#include <exception>
 #include <random>
 #include <sstream>
 #include <string_view>
 #include <utility>
 
+#include "toolkit/file_stream.h"
 #include "toolkit/zuno_func.h"
 
 namespace {
@@ -17,15 +19,15 @@ constexpr char kWhiteSpace[] = " \t\n\v\f\r";
 constexpr int kLargestRandom = 2147483647;
 
 unsigned int random_seed() {
-  try {
-    return std::random_device("/dev/urandom")();
-  } catch (const std::exception&) {
+  // The standard library's random_device would open it for a moment in which children inherit it.
+  unsigned int seed = 1;
+  const android::base::unique_fd device = sentrova::toolkit::open_to_read("/dev/urandom");
+  if (!android::base::ReadFully(device, &seed, sizeof(seed))) {
     // A root without /dev: the kernel is asked directly. It cannot refuse a request this small once
     // it has booted; a constant seed is left for a caller that asks before.
-    unsigned int seed = 1;
     static_cast<void>(getrandom(&seed, sizeof(seed), GRND_NONBLOCK) == 0);
-    return seed;
   }
+  return seed;
 }
 
 // Returns whether the stream operator finds an int at the start of `text`. `value` is then the int;

@@ -33,6 +33,7 @@ int ZunoFunc::timespec_diff_ms(timespec& start, timespec& end) {
 std::string ZunoFunc::Get_Current_Date() {
   const time_t now = time(nullptr);
   tm local = {};
+  tzset();  // localtime_r by itself keeps the zone that the process started with
   localtime_r(&now, &local);
   return android::base::StringPrintf("%04d-%02d-%02d--%02d-%02d-%02d", local.tm_year + 1900,
                                      local.tm_mon + 1, local.tm_mday, local.tm_hour, local.tm_min,

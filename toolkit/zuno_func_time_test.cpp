@@ -11,8 +11,6 @@ TEST(TimespecDiff, BorrowsNanosecondsFromTheSeconds) {
     timespec start, end, difference;
   };
   const Case cases[] = {{{1, 900'000'000}, {3, 100'000'000}, {1, 200'000'000}},
-                        {{1, 100'000'000}, {3, 900'000'000}, {2, 800'000'000}},
-                        {{5, 0}, {5, 0}, {0, 0}},
                         {{3, 100'000'000}, {1, 900'000'000}, {-2, 800'000'000}}};
   for (Case c : cases) {
     const timespec difference = ZunoFunc::timespec_diff(c.start, c.end);
@@ -40,7 +38,6 @@ TEST(TimespecDiffMs, CutsBothTimesBeforeItSubtractsAndWrapsAt32Bits) {
 TEST(GetCurrentDate, IsTheLocalTimeInItsForm) {
   const std::string outer_zone = getenv("TZ") != nullptr ? getenv("TZ") : "";
   setenv("TZ", "XYZ-5:30", 1);  // five and a half hours ahead, so that UTC would show
-  tzset();
   const time_t before = time(nullptr);
   const std::string date = ZunoFunc::Get_Current_Date();
   const time_t after = time(nullptr);

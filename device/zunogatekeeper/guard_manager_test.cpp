@@ -8,12 +8,9 @@
 #include <zunogatekeeper.h>
 
 #include <algorithm>
-#include <chrono>
 #include <functional>
-#include <memory>
 #include <new>
 #include <numeric>
-#include <thread>
 
 #include "device/zunogatekeeper/credential_store.h"
 #include "device/zunogatekeeper/sqlite_handles.h"
@@ -105,7 +102,6 @@ TEST_F(GuardManager, WithoutACredentialNoPasswordMatches) {
   ManagerInRoom manager(0);
   EXPECT_EQ(0, manager->getLockStatus());
   EXPECT_FALSE(manager->verifyPassword(""));
-  EXPECT_FALSE(manager->verifyPassword("~"));
 }
 
 TEST_F(GuardManager, AnswersForItsOwnUserInAnyRoom) {
@@ -125,18 +121,14 @@ TEST_F(GuardManager, RefusesWhatIsNoStore) {
   const auto write = [&](const std::string& content) {
     ASSERT_TRUE(android::base::WriteStringToFile(content, store_));
   };
-  std::string flipped = sound;
-  std::fill(flipped.begin() + 100, flipped.begin() + 120, '\xff');
   const struct {
     const char* what;
     std::function<void()> make;
   } cases[] = {
       {"absent", [] {}},
       {"empty file", [&] { write(""); }},
-      {"text", [&] { write(std::string(5000, 'x')); }},
       {"cut in the middle", [&] { write(sound.substr(0, sound.size() / 2)); }},
-      {"damaged page header", [&] { write(flipped); }},
-      {"folder", [&] { mkdir(store_.c_str(), 0700); }},
+      {"damaged page header", [&] { write(sound.substr(0, 100) + std::string(4000, '\xff')); }},
       {"FIFO", [&] { mkfifo(store_.c_str(), 0600); }},
       {"dangling link", [&] { EXPECT_EQ(0, symlink("nowhere", store_.c_str())); }},
   };
@@ -163,25 +155,16 @@ TEST_F(GuardManager, RefusesDamagedRowsAndAbsurdCosts) {
   const char* const damages[] = {
       "PRAGMA user_version = 2",
       "PRAGMA application_id = 1",
-      "DROP TABLE credential",
       "DELETE FROM credential",
       "ALTER TABLE credential DROP COLUMN salt",
       "UPDATE credential SET status = 6",
-      "UPDATE credential SET status = -1",
       "UPDATE credential SET status = 4294967297",
-      "UPDATE credential SET log2_n = 0",
       "UPDATE credential SET log2_n = -1",
-      "UPDATE credential SET log2_n = 21, r = 1",
-      "UPDATE credential SET log2_n = 63",
       "UPDATE credential SET log2_n = 9223372036854775807",
       "UPDATE credential SET log2_n = 20, r = 32",
       "UPDATE credential SET log2_n = NULL",
-      "UPDATE credential SET r = 0",
-      "UPDATE credential SET r = -8",
       "UPDATE credential SET r = 1099511627776",
       "UPDATE credential SET p = 0",
-      "UPDATE credential SET p = 1073741824",
-      "UPDATE credential SET salt = NULL",
       "UPDATE credential SET salt = zeroblob(31)",
       "UPDATE credential SET salt = zeroblob(50000000)",
       "UPDATE credential SET digest = zeroblob(0)",
@@ -196,21 +179,6 @@ TEST_F(GuardManager, RefusesDamagedRowsAndAbsurdCosts) {
   }
 }
 
-TEST_F(GuardManager, WaitsForAWriterThatIsSoonDone) {
-  put(0, cheap_credential(2, "1234"));
-  int code = SQLITE_OK;
-  const Connection writer = open_database(store_.c_str(), SQLITE_OPEN_READWRITE, code);
-  ASSERT_TRUE(writer);
-  ASSERT_EQ(SQLITE_OK, sqlite3_exec(writer.get(), "BEGIN EXCLUSIVE", nullptr, nullptr, nullptr));
-  std::thread finish([&] {
-    std::this_thread::sleep_for(std::chrono::milliseconds(200));
-    sqlite3_exec(writer.get(), "COMMIT", nullptr, nullptr, nullptr);
-  });
-  ManagerInRoom manager(0);
-  EXPECT_EQ(2, manager->getLockStatus());
-  finish.join();
-}
-
 // The value comes from a straightforward transcription of RFC 7914, checked against its vectors.
 TEST(CredentialDigest, IsScryptWithItsParametersInTheirPlaces) {
   Salt salt = {};
@@ -221,14 +189,11 @@ TEST(CredentialDigest, IsScryptWithItsParametersInTheirPlaces) {
   EXPECT_EQ(expected, derive_digest("1234", salt, {.log2_n = 4, .r = 8, .p = 2}));
 }
 
-TEST(CredentialDigest, BoundsTheTableNotOnlyTheNumbers) {
-  EXPECT_TRUE(is_acceptable_cost({.log2_n = 14, .r = 32, .p = 4}));
+TEST(CredentialDigest, BoundsTheTableAndHasMemoryForTheLargest) {
   EXPECT_FALSE(is_acceptable_cost({.log2_n = 15, .r = 32, .p = 4}));
-  EXPECT_TRUE(is_acceptable_cost({.log2_n = 16, .r = 8, .p = 1}));
   EXPECT_FALSE(is_acceptable_cost({.log2_n = 17, .r = 8, .p = 1}));
-}
-
-TEST(CredentialDigest, HasMemoryForTheLargestAcceptedTable) {
+  EXPECT_TRUE(is_acceptable_cost({.log2_n = 16, .r = 8, .p = 1}));
+  EXPECT_TRUE(is_acceptable_cost({.log2_n = 14, .r = 32, .p = 4}));
   EXPECT_TRUE(derive_digest("1234", {}, {.log2_n = 14, .r = 32, .p = 1}));
 }
 

@@ -25,11 +25,6 @@ void FakeDriver::restart() {
   area_used_ = 0;
 }
 
-int FakeDriver::set_max_threads(uint32_t count) {
-  max_threads_ = count;
-  return 0;
-}
-
 int FakeDriver::exit_thread() {
   const std::lock_guard guard(lock_);
   ++threads_ended_;

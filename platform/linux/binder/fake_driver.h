@@ -46,7 +46,7 @@ class FakeDriver : public Driver {
   };
 
   int write_read(binder_write_read* exchange) override;
-  int set_max_threads(uint32_t count) override;
+  int set_max_threads(uint32_t) override { return 0; }
   int become_context_manager() override { return -EBUSY; }
   int exit_thread() override;
   std::span<const uint8_t> receive_area() const override { return area_; }
@@ -80,7 +80,6 @@ class FakeDriver : public Driver {
   std::map<uint32_t, HandleState> handles() const;
   std::vector<std::string> breaches() const;
   int threads_ended() const;
-  uint32_t max_threads() const { return max_threads_; }
   // Makes the driver claim another count of consumed bytes in its next exchange.
   void miscount_next() { miscount_ = true; }
 
@@ -96,7 +95,6 @@ class FakeDriver : public Driver {
   std::map<uint32_t, HandleState> handles_;
   std::vector<std::string> breaches_;
   int threads_ended_ = 0;
-  uint32_t max_threads_ = 0;
   bool miscount_ = false;
   alignas(8) uint8_t area_[65536] = {};
   size_t area_used_ = 0;

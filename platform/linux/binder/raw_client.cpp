@@ -39,7 +39,6 @@ RawClient::Answer RawClient::take(const binder_transaction_data& transaction) {
   answer.command = BR_REPLY;
   answer.is_status = (transaction.flags & TF_STATUS_CODE) != 0;
   const auto* const data = reinterpret_cast<const char*>(transaction.data.ptr.buffer);
-  answer.data.assign(data, transaction.data_size);
   if (transaction.offsets_size != 0) {
     const auto offset =
         copied<uint64_t>(reinterpret_cast<const char*>(transaction.data.ptr.offsets));
@@ -82,7 +81,7 @@ RawClient::Answer RawClient::call(uint32_t handle, uint32_t code, const std::str
       if (command == BR_REPLY)
         return take(copied<binder_transaction_data>(payload));
       if (command == BR_FAILED_REPLY || command == BR_DEAD_REPLY)
-        return {command, false, {}, 0};
+        return {command, false, 0};
       if (command == BR_INCREFS || command == BR_ACQUIRE)
         answer_reference(command, payload);
     }

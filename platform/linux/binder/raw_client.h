@@ -15,7 +15,6 @@ class RawClient {
   struct Answer {
     uint32_t command = 0;  // BR_REPLY or how the call failed; 0: the driver itself failed
     bool is_status = false;
-    std::string data;
     uint32_t handle = 0;  // of the first object in the reply, which the client keeps
   };
 
