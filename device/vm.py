@@ -14,9 +14,11 @@ import socket
 import subprocess
 import tempfile
 import time
-from collections.abc import Callable
+from collections.abc import Callable, Iterable
 from dataclasses import dataclass, field
 from pathlib import Path
+
+from device import removable_media
 
 ROOT = Path(__file__).resolve().parent.parent
 IMAGE = ROOT / "build/image"
@@ -77,7 +79,9 @@ class Device:
     def __enter__(self) -> Device:
         self._folder = Path(tempfile.mkdtemp(prefix="sentrova-device-"))
         self.share = self._folder / "share"
-        self.share.mkdir()
+        self._requests = self.share / "requests"
+        self._requests.mkdir(parents=True)
+        self._media: list[str] = []
         self._process: subprocess.Popen[bytes] | None = None
         return self
 
@@ -92,6 +96,7 @@ class Device:
     ) -> Outcome:
         """Boots, runs the story and waits for the end; `on_output` gets its output as it comes."""
         shutil.copy(story, self.share / "story")
+        self._prepare_media(removable_media.wanted_kinds(story.read_text()))
         for part in (STORIES / "lib").iterdir():
             shutil.copy(part, self.share)
         started = time.monotonic()
@@ -109,6 +114,8 @@ class Device:
                 first_answer = elapsed
             if on_output is not None:
                 shown = self._show_new_output(shown, on_output)
+            if running:
+                removable_media.serve_requests(self._requests, self._folder, self.qmp)
             if running and elapsed > timeout_seconds:
                 timed_out = True
                 print(f"device: no end after {timeout_seconds} s; it is {self.qmp_status()}")
@@ -122,6 +129,7 @@ class Device:
     def run_console(self) -> int:
         """Boots with a shell on this terminal and waits for its end; returns its exit status."""
         self.kernel_arguments = [*self.kernel_arguments, "prop.ro.boot.console=1"]
+        self._prepare_media(removable_media.KINDS)
         self._start(["-serial", "mon:stdio"], interactive=True)
         assert self._process is not None
         self._process.wait()
@@ -181,10 +189,12 @@ class Device:
         disk = IMAGE / "disk/disk.img"
         command += ["-drive", f"file={disk},if=none,id=disk,format=raw,snapshot=on"]
         command += ["-device", "virtio-blk-pci,drive=disk"]
-        # Removable media are plugged in by name while the device runs.
-        command += ["-device", "sdhci-pci,id=sd0", "-device", "sdhci-pci,id=sd1"]
-        command += ["-device", "qemu-xhci,id=xhci"]
+        command += removable_media.qemu_arguments(self._folder, self._media)
         return command + ["-qmp", f"unix:{self._folder}/qmp,server=on,wait=off"]
+
+    def _prepare_media(self, kinds: Iterable[str]) -> None:
+        self._media = list(kinds)
+        removable_media.make_disks(self._folder, self._media)
 
     @staticmethod
     def _shared_folder(tag: str, folder: Path, read_only: bool) -> list[str]:

@@ -61,6 +61,17 @@ class RunStory(unittest.TestCase):
         self.assertIn("no result", outcome.problem)
         self.assertIn("panic", outcome.problem)
 
+    def test_ports_and_requests(self) -> None:
+        # Nobody listens at the machine's socket, so that the request must fail; the story goes on.
+        script = ("echo \"$@\" >log.txt; : >requests/plug_usb; "
+                  "until [ -s requests/plug_usb.failed ]; do sleep 0.02; done; echo 0 >result")
+        self.assertNotIn("qemu-xhci", self.run_story(script)[0].log)
+        self.story.write_text("# Shows something\n# devices: usb\n")
+        outcome, _ = self.run_story(script)
+        self.assertEqual((outcome.status, outcome.problem), (0, ""))
+        self.assertIn("qemu-xhci", outcome.log)
+        self.assertNotIn("sdhci", outcome.log)
+
     def test_power_request(self) -> None:
         outcome, _ = self.run_story("echo reboot,recovery >powerctl")
         self.assertEqual((outcome.power_request, outcome.status), ("reboot,recovery", None))

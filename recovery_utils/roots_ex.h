@@ -1,0 +1,65 @@
+#pragma once
+
+#include <fstab/fstab.h>
+
+#include <string>
+
+#include "common/export.h"
+
+// What the vendor adds to the volume table: rows for removable media, the classification of the
+// data partition's encryption, the system partition's row, and the removable devices themselves.
+//
+// Messages go to standard output, each line beginning with "[ROOTS]" and a level. Nothing here
+// takes a lock; see roots.h for threads. Properties are the platform's.
+
+// Completes a table that was just read:
+// - appends a vfat row for /otg (on sdg1 of a device with UFS storage, else on sda1) and one for
+//   /sdcard (on what zuno_search_sdcard_device returns, possibly nothing) if it has none;
+// - sets "ro.crypto.type" to "file" or "block" by the flags of the row for /data, if they declare
+//   either;
+// - mounts /data once, where it stays mounted, and sets "ro.crypto.state" to "encrypted" where the
+//   outcome shows that it is: file-based with a key version file or, unmountable, with metadata
+//   encryption; block-based and unmountable. The type counts as the property shows it, whoever set
+//   it.
+// Failures are logged and nothing is returned: an empty table is left empty, and one without a row
+// for /data gets only the two rows.
+SENTROVA_API void zuno_load_volume_table(android::fs_mgr::Fstab& table);
+
+// On a device whose system partition is the root or lies in super ("ro.build.system_root_image" or
+// "ro.boot.dynamic_partitions"), makes the table's row for /mnt/system name the system partition of
+// the current slot ("ro.boot.slot_suffix"): appends or overwrites one row, as a copy of the row of
+// the system root. Leaves the table as it is if it is empty (with a message), names the partition
+// already, or has no row to copy.
+//
+// A partition is named by a block device that is its name or ends with "/" and its name. A system
+// root whose block device is shorter than the name cannot be compared with it; its row is then
+// appended unless it stands at /mnt/system itself, also beside another row for /mnt/system.
+SENTROVA_API void zuno_try_update_fstab_for_root_check(android::fs_mgr::Fstab& table);
+
+// Returns whether the row has a metadata key directory and is encrypted by file
+// (`file_encryption` or `force_fde_or_fbe`).
+SENTROVA_API bool should_use_metadata_encryption(const android::fs_mgr::FstabEntry& entry);
+
+// Returns the platform's mount point of the system partition, "/" or "/system".
+SENTROVA_API std::string get_system_root();
+
+// Returns the block device of the SD card: the first that exists of mmcblk0p1 (only on a device
+// with UFS storage), mmcblk1p1, mmcblk1 and the device of the volume table's row for /sdcard. Empty
+// if there is none.
+SENTROVA_API std::string zuno_search_sdcard_device();
+
+// Returns whether zuno_search_sdcard_device finds a device.
+SENTROVA_API bool zuno_find_sdcard_device();
+
+// Switches the USB controller to host mode by writing "enabled" to its host_mode file, makes the
+// directory /otg and waits for a disk: the device of the volume table's row for /otg or one of the
+// usual ones. The file is chosen by "ro.zuno.product.solution" (QCOM if absent, MTK or SAMSUNG) and
+// "ro.zuno.product.platform", else searched under /sys/devices/platform; once found it is kept
+// until the process ends. On MTK and SAMSUNG every call that comes to the wait puts two more
+// devices in front of the usual ones with UFS storage.
+//
+// Returns true once a device is there and still is a second later; false if the file, the directory
+// or the row for /otg is missing or cannot be made, or no device stays within 300 looks 200
+// milliseconds apart (about a minute when nothing appears; each device that vanishes within its
+// second adds it). Host mode and directory stay in either case. Blocks; one call at a time.
+SENTROVA_API bool zuno_enable_otg_device();
