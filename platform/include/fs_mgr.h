@@ -11,13 +11,13 @@
 #define FS_MGR_DOMNT_SUCCESS 0
 
 // Mounts one row at `mount_point`, or at its own mount point where that is empty, with the row's
-// type, flags and options. A missing directory is made (mode 0755). With the option "wait" the device node is
-// waited for, at most 20 seconds. With "check" an ext4 or f2fs volume is first repaired as far as
-// that is safe, if /system/bin/e2fsck (or /system/bin/fsck.f2fs) is there; whatever the tool finds,
-// the mount is tried. Never formats.
-// Returns FS_MGR_DOMNT_SUCCESS; FS_MGR_DOMNT_BUSY, with `errno` EBUSY, when the device is mounted
-// there already or held by something else; FS_MGR_DOMNT_FAILED with `errno` otherwise, ENOENT where
-// the device did not appear. All threads; blocks meanwhile.
+// type, flags and options. A missing directory is made (mode 0755). With the option "wait" the
+// device node is waited for, at most 20 seconds. With "check" an ext4 or f2fs volume is first
+// repaired as far as that is safe, if /system/bin/e2fsck (or /system/bin/fsck.f2fs) is there;
+// whatever the tool finds, the mount is tried. Never formats. Returns FS_MGR_DOMNT_SUCCESS;
+// FS_MGR_DOMNT_BUSY, with `errno` EBUSY, when the device is mounted there already or held by
+// something else; FS_MGR_DOMNT_FAILED with `errno` otherwise, ENOENT where the device did not
+// appear. All threads; blocks meanwhile.
 SENTROVA_API int fs_mgr_do_mount_one(const android::fs_mgr::FstabEntry& entry,
                                      const std::string& mount_point = "");
 

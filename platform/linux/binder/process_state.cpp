@@ -15,8 +15,8 @@
 namespace android {
 namespace {
 
-using sentrova::binder::kContextManagerHandle;
 using sentrova::binder::Driver;
+using sentrova::binder::kContextManagerHandle;
 using sentrova::binder::ProcessContext;
 
 constexpr const char* kDefaultDriver = "/dev/binder";
