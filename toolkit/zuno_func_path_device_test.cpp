@@ -104,7 +104,7 @@ TEST_F(ZunoFuncLabels, AreLeftToTheKernelWhereNoneIsKnown) {
 
 TEST_F(ZunoFuncLabels, DoNotOutliveAFailure) {
   // A dangling link is absent to the look and in the way of mkdir.
-  ASSERT_EQ(symlink("/nowhere", folder("labelled").c_str()), 0);
+  ASSERT_EQ(symlink("/no/such/target", folder("labelled").c_str()), 0);
   errno = 0;
   EXPECT_FALSE(ZunoFunc::Recursive_Mkdir(folder("labelled/x"), 0755, false, labels_.get()));
   EXPECT_EQ(errno, EEXIST);

@@ -1,3 +1,4 @@
+#include <android-base/errno_restorer.h>
 #include <android-base/logging.h>
 #include <fs_mgr.h>
 #include <sys/mount.h>
@@ -38,6 +39,12 @@ bool may_repair(const FstabEntry& entry, const std::string& target) {
          sentrova::fs_mgr::mount_state(target) == sentrova::fs_mgr::MountState::kNotMounted;
 }
 
+// A directory that is there stays as it is. Keeps `errno`: callers show it after a success too.
+void make_mount_point(const std::string& target) {
+  const android::base::ErrnoRestorer keep_errno;
+  mkdir(target.c_str(), kMountPointMode);
+}
+
 int failed(const FstabEntry& entry, const std::string& target) {
   PLOG(WARNING) << "cannot mount " << entry.blk_device << " at " << target << " as "
                 << entry.fs_type;
@@ -54,7 +61,7 @@ int fs_mgr_do_mount_one(const FstabEntry& entry, const std::string& mount_point)
   if (may_repair(entry, target)) {
     sentrova::fs_mgr::repair_file_system(entry.blk_device, entry.fs_type);
   }
-  mkdir(target.c_str(), kMountPointMode);  // one that is there stays as it is
+  make_mount_point(target);
   if (mount(entry.blk_device.c_str(), target.c_str(), entry.fs_type.c_str(), entry.flags,
             entry.fs_options.c_str()) != 0) {
     return failed(entry, target);

@@ -5,6 +5,7 @@
 #include <fs_mgr/roots.h>
 #include <gtest/gtest.h>
 #include <sys/mount.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -34,6 +35,12 @@ extern "C" int mount(const char* device, const char* target, const char* type, u
                      const void* data) noexcept {
   return answer("mount " + std::string(device) + " " + target + " " + type + " " +
                 std::to_string(flags) + " " + static_cast<const char*>(data));
+}
+
+// The mount points here are names only.
+extern "C" int mkdir(const char* /*path*/, mode_t /*mode*/) noexcept {
+  errno = EEXIST;
+  return -1;
 }
 
 extern "C" int umount(const char* target) noexcept {
