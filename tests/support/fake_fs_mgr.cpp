@@ -29,6 +29,16 @@ bool ReadDefaultFstab(Fstab* fstab) {
   return FakeFsMgr::instance().read_default_fstab(fstab);
 }
 
+bool EnsurePathMounted(Fstab* fstab, const std::string& path, const std::string& mount_point) {
+  FakeFsMgr::instance().calls.push_back("ensure mounted " + path + " at " + mount_point);
+  return FakeFsMgr::instance().ensure_mounted(fstab, path, mount_point);
+}
+
+bool EnsurePathUnmounted(Fstab* fstab, const std::string& path) {
+  FakeFsMgr::instance().calls.push_back("ensure unmounted " + path);
+  return FakeFsMgr::instance().ensure_unmounted(fstab, path);
+}
+
 std::string GetSystemRoot() {
   return FakeFsMgr::instance().system_root;
 }
@@ -38,4 +48,13 @@ std::string GetSystemRoot() {
 int fs_mgr_do_mount_one(const android::fs_mgr::FstabEntry& entry, const std::string& mount_point) {
   FakeFsMgr::instance().calls.push_back("mount " + entry.blk_device + " at " + mount_point);
   return FakeFsMgr::instance().mount_one(entry);
+}
+
+std::string fs_mgr_get_slot_suffix() {
+  return FakeFsMgr::instance().slot_suffix;
+}
+
+std::string fs_mgr_get_super_partition_name(int slot) {
+  FakeFsMgr::instance().calls.push_back("super partition of slot " + std::to_string(slot));
+  return FakeFsMgr::instance().super_partition_name;
 }

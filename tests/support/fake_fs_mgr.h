@@ -13,9 +13,19 @@ struct FakeFsMgr {
   std::function<bool(android::fs_mgr::Fstab*)> read_default_fstab = [](auto*) { return false; };
   // Sets `errno` as the platform's would.
   std::function<int(const android::fs_mgr::FstabEntry&)> mount_one = [](const auto&) { return -1; };
+  // These too. The second argument is the path; the third the mount point, empty for the row's own.
+  std::function<bool(android::fs_mgr::Fstab*, const std::string&, const std::string&)>
+      ensure_mounted = [](auto*, const auto&, const auto&) { return false; };
+  std::function<bool(android::fs_mgr::Fstab*, const std::string&)> ensure_unmounted =
+      [](auto*, const auto&) { return false; };
   std::string system_root = "/system";
+  std::string slot_suffix;
+  std::string super_partition_name = "super";
 
-  std::vector<std::string> calls;  // "read fstab", "mount /dev/block/x at /data"
+  // "read fstab", "mount /dev/block/x at /data", "ensure mounted /data/x at /mnt", "ensure
+  // unmounted /data", "super partition of slot -1". The fake device mapper and the kernel script
+  // add theirs, so that the order of all shows.
+  std::vector<std::string> calls;
 
   static FakeFsMgr& instance();
   void reset() { *this = FakeFsMgr(); }
