@@ -38,3 +38,31 @@ SENTROVA_API android::fs_mgr::FstabEntry* zuno_volume_for_path(const std::string
 // answer is kept, whatever becomes of the table. Aborts the process, after a fatal line in the base
 // log, while the table is empty.
 SENTROVA_API bool HasCache();
+
+// Mounting and unmounting by path. Messages go to the base log, which keeps `errno`; what the
+// vendor mount path says goes to standard output. All of it blocks as long as the mounts take.
+
+// Mounts the volume that serves `path` at `mount_point`, or at its row's mount point where that is
+// empty, making the directory (mode 0755) if it is missing. Whether something is mounted is asked
+// of that directory alone, whatever it is.
+//
+// A target beginning with "/otg" first has zuno_enable_otg_device wait for the disk. The platform
+// mounts the volume, which it is kept from formatting; where it fails or leaves `errno` at EBUSY,
+// and at once for a target beginning with "/sdcard" ("/sdcard1" too), zuno_ensure_path_mounted
+// (roots_ex.h) does. That mounts the row at its own mount point, also where `mount_point` differs.
+//
+// Returns 0 if something is mounted there already or the volume is now, -1 if `path` is empty, has
+// no row, or the kernel's table of mounts cannot be read, else what the vendor mount path returns.
+SENTROVA_API int ensure_path_mounted_at(const std::string& path, const std::string& mount_point);
+
+// As ensure_path_mounted_at with an empty mount point.
+SENTROVA_API int ensure_path_mounted(const std::string& path);
+
+// Has the platform unmount the volume that serves `path`, once and without force. Returns 0 if it
+// is not mounted any more, else -1. See roots_ex.h for the one with force.
+SENTROVA_API int ensure_path_unmounted(const std::string& path);
+
+// Mounts /tmp, /cache and /data as far as the table has rows for them and unmounts all other
+// volumes but "/", "/sdcard" and "/otg", in the table's order. Returns 0, or -1 at the first row
+// that fails, with the rows before it as they were set, or if the table is empty.
+SENTROVA_API int setup_install_mounts();

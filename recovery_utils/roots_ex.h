@@ -7,7 +7,8 @@
 #include "common/export.h"
 
 // What the vendor adds to the volume table: rows for removable media, the classification of the
-// data partition's encryption, the system partition's row, and the removable devices themselves.
+// data partition's encryption, the system partition's row, the removable devices themselves, and
+// mounting and unmounting where the platform's own is not enough.
 //
 // Messages go to standard output, each line beginning with "[ROOTS]" and a level. Nothing here
 // takes a lock; see roots.h for threads. Properties are the platform's.
@@ -63,3 +64,43 @@ SENTROVA_API bool zuno_find_sdcard_device();
 // milliseconds apart (about a minute when nothing appears; each device that vanishes within its
 // second adds it). Host mode and directory stay in either case. Blocks; one call at a time.
 SENTROVA_API bool zuno_enable_otg_device();
+
+// Mounts the table's row `entry` at its own mount point, which must exist, as the vendor does it.
+// Rows are known by a mount point that is "/data", "/sdcard" or "/otg" or lies below it:
+// - data: the device-mapper device "userdata" where "ro.crypto.state" is "encrypted" and either
+//   "ro.crypto.type" is "block" or "ro.crypto.metadata.enabled" is true, else the row's device. A
+//   device-mapper device is waited for, 25 times 200 milliseconds. Two attempts, each with its
+//   wait; a device that is busy counts as a failure, though the message calls it a success.
+// - SD card: what zuno_search_sdcard_device finds, with the row's type, then as exfat. Three
+//   attempts, with a second's sleep after each search that finds nothing.
+// - OTG: the disk's first partition, then the whole disk (sdg on a device with UFS storage, else
+//   sda), each as vfat, then as exfat.
+// Returns 0, or the result of the last mount(2) that failed; -1 where none was tried, without a
+// message for other rows. A null `entry` is logged and returns -1. The row stays the caller's and
+// as it is.
+SENTROVA_API int zuno_ensure_path_mounted(android::fs_mgr::FstabEntry* entry);
+
+// Reads the default fstab anew, not touching the volume table, and has the platform mount the
+// volume that serves `path` at its mount point, making the directory (mode 0755) if it is missing.
+// Returns 0 if it is mounted (already, or held busy by another mount), -1 on any failure.
+SENTROVA_API int zuno_fs_mgr_do_mount_one(const std::string& path);
+
+// Returns the block device of volume_for_mount_point(`mount_point`), or "" if there is no row.
+SENTROVA_API std::string blkdevice_for_mount_point(const std::string& mount_point);
+
+// Removes the device-mapper device `name`. A busy device gets five tries 100 milliseconds apart,
+// any other failure ends them. Returns true if there is no such device any more; false if it stays,
+// or for an empty name.
+SENTROVA_API bool volume_revert_dm_device(const std::string& name);
+
+// As ensure_path_unmounted of roots.h. Where that fails and `force` is set, unmounts the volume
+// patiently (unmount_mounted_volume, which kills the processes that hold it) and tries again.
+// Returns 0 if the volume is not mounted any more, also where nothing is mounted at its row's mount
+// point; non-zero if either step failed, no row serves `path` or the kernel's table of mounts
+// cannot be read.
+SENTROVA_API int ensure_path_unmounted(const std::string& path, bool force);
+
+// Unmounts, with force, every volume of the table but "/", "/tmp" and "/cache", loading the table
+// first if it is empty. Returns 0 whatever came of each volume, which the messages tell (these
+// without a tag); -1 if there is no table.
+SENTROVA_API int setup_install_unmounts();
