@@ -19,8 +19,8 @@
 namespace sentrova::testing {
 
 // A test of mounting and unmounting where, besides what RootsTest provides, the kernel's table of
-// mounts is the test's own, and empty at first, as is all of /proc, and the device mapper is the
-// fake. Mounts are played while the test has a KernelScript.
+// mounts is the test's own, as is all of /proc, and the device mapper is the fake. Mounts are
+// played while the test has a KernelScript.
 class MountTest : public RootsTest {
  protected:
   using Calls = std::vector<std::string>;
@@ -30,21 +30,18 @@ class MountTest : public RootsTest {
     if (!IsSkipped()) {
       device_mapper_.reset();
       proc_.emplace("/proc");
-      set_mounted({});
+      set_mounted("/");
     }
   }
 
-  // Makes these the mount points in the kernel's table.
-  static void set_mounted(const std::vector<std::string>& mount_points) {
-    std::string table;
-    for (const std::string& mount_point : mount_points) {
-      table += "/dev/block/any " + mount_point + " ext4 rw 0 0\n";
+  // Makes this the only mount point in the kernel's table; "": the table cannot be read.
+  static void set_mounted(const std::string& mount_point) {
+    std::filesystem::remove("/proc/mounts");
+    if (!mount_point.empty()) {
+      const std::string line = "/dev/block/any " + mount_point + " ext4 rw 0 0\n";
+      ASSERT_TRUE(android::base::WriteStringToFile(line, "/proc/mounts"));
     }
-    ASSERT_TRUE(android::base::WriteStringToFile(table, "/proc/mounts"));
   }
-
-  // From now on the kernel's table cannot be read.
-  static void hide_mounts() { std::filesystem::remove("/proc/mounts"); }
 
   // As output_of, with the lines of the base log at their places as "E roots.cpp:122 text". The log
   // destroys `errno`.
@@ -58,9 +55,6 @@ class MountTest : public RootsTest {
     android::base::SetLogger(android::base::StderrLogger);
     return messages;
   }
-
-  // Returns the calls so far and forgets them.
-  Calls take_calls() { return std::exchange(platform_.calls, {}); }
 
   FakeDeviceMapper& device_mapper_ = FakeDeviceMapper::instance();
 
