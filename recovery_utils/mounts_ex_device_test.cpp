@@ -8,7 +8,6 @@
 #include <sys/mman.h>
 #include <sys/mount.h>
 #include <sys/syscall.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <filesystem>
@@ -18,6 +17,7 @@
 #include "common/export.h"
 #include "recovery_utils/mounts_ex.h"
 #include "tests/support/captured_stdout.h"
+#include "tests/support/holder.h"
 #include "tests/support/loop_device.h"
 #include "tests/support/private_mounts.h"
 
@@ -25,46 +25,10 @@ namespace {
 
 using android::base::unique_fd;
 using sentrova::testing::CapturedStdout;
+using sentrova::testing::Holder;
 using ::testing::HasSubstr;
 
 int umount_calls = 0;
-
-// A process that has done `hold` and then waits.
-class Holder {
- public:
-  explicit Holder(const std::function<void()>& hold) {
-    unique_fd ready, waiting;
-    EXPECT_TRUE(android::base::Pipe(&waiting, &ready));
-    pid_ = fork();
-    if (pid_ == 0) {
-      hold();
-      ready.reset();
-      while (true) {
-        pause();
-      }
-    }
-    ready.reset();
-    char byte;
-    EXPECT_EQ(read(waiting.get(), &byte, 1), 0);
-  }
-  ~Holder() {
-    kill(pid_, SIGKILL);
-    waitpid(pid_, nullptr, 0);
-  }
-  Holder(const Holder&) = delete;
-  Holder& operator=(const Holder&) = delete;
-
-  // Returns the signal that has ended the process, or 0 if it lives. The process stays to be
-  // reaped.
-  int ended_by() const {
-    siginfo_t info = {};
-    EXPECT_EQ(waitid(P_PID, static_cast<id_t>(pid_), &info, WEXITED | WNOHANG | WNOWAIT), 0);
-    return info.si_pid == pid_ ? info.si_status : 0;
-  }
-
- private:
-  pid_t pid_;
-};
 
 // An ext4 volume, mounted at a path with a space, as a card's label gives it.
 class BusyVolume : public ::testing::Test {
