@@ -73,9 +73,9 @@ SENTROVA_API bool zuno_enable_otg_device();
 //   wait; a device that is busy counts as a failure, though the message calls it a success.
 // - SD card: what zuno_search_sdcard_device finds, with the row's type, then as exfat. Three
 //   attempts, with a second's sleep after each search that finds nothing.
-// - OTG: the disk's first partition, then the whole disk (sdg on a device with UFS storage, else
-//   sda), each as vfat, then as exfat, until one is mounted. One that is busy counts as a failure
-//   here too, but its other type is not tried.
+// - OTG: the disk's first partition, then the whole disk (sdg on a device with UFS storage, after
+//   what zuno_enable_otg_device has added; else sda), each as vfat, then as exfat, until one is
+//   mounted. One that is busy counts as a failure here too, but its other type is not tried.
 // Returns 0, or the result of the last mount(2) that failed; -1 where none was tried, without a
 // message for other rows. A null `entry` is logged and returns -1. The row stays the caller's and
 // as it is.

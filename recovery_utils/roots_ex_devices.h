@@ -28,7 +28,7 @@ struct OtgDevices {
 };
 
 // Returns the process's one set of lists. zuno_enable_otg_device makes the UFS list longer;
-// mounting by the vendor path keeps to the devices above. Not locked.
+// mounting by the vendor path sees that. Not locked.
 OtgDevices& otg_devices();
 
 }  // namespace sentrova::roots_ex

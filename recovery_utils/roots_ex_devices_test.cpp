@@ -232,6 +232,10 @@ TEST_F(OtgDevice, EveryCallOnMtkAndSamsungPutsTwoMoreDevicesInFront) {
         expected.insert(expected.begin() + 1, {"/dev/block/sdd1", "/dev/block/sdd"});
         EXPECT_EQ(reported_devices(output, 60), expected);
       }
+      make_file("/dev/block/sdd1");
+      EXPECT_THAT(output_of([] { zuno_ensure_path_mounted(volume_for_mount_point("/otg")); }),
+                  HasSubstr("otg mount fail(blk_device: /dev/block/sdd1, fs_type: vfat)"))
+          << "where it was found, it is mounted from";
     });
   }
 }

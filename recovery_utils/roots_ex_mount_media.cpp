@@ -20,9 +20,6 @@ constexpr unsigned int kSdcardSearchSeconds = 1;
 
 constexpr char kOtgMounter[] = "zuno_mount_otg";  // names itself in its messages
 
-// Tried in this order, the partition before the whole disk.
-constexpr const char* kOtgCandidates[] = {kOtgDevice, kOtgDisk};
-constexpr const char* kOtgCandidatesUfs[] = {kOtgDeviceUfs, kOtgDiskUfs};
 constexpr const char* kOtgFileSystems[] = {"vfat", "exfat"};
 
 // The row's options are those of its own type, so none are passed on.
@@ -50,17 +47,17 @@ int try_sdcard(const std::string& device, const FstabEntry& row, int attempt) {
 }
 
 // Returns the last mount's result. A busy candidate is done with, but stays a failure.
-int try_otg_candidate(const char* candidate, const FstabEntry& row) {
+int try_otg_candidate(const std::string& candidate, const FstabEntry& row) {
   int result = -1;
   for (const char* file_system : kOtgFileSystems) {
-    result = mount_medium(candidate, row, file_system);
+    result = mount_medium(candidate.c_str(), row, file_system);
     if (result == 0 || errno == EBUSY) {
       fprintf(stdout, "[%s]I: %s otg mount sucess(blk_device: %s, fs_type: %s)\n", kLogTag,
-              kOtgMounter, candidate, file_system);
+              kOtgMounter, candidate.c_str(), file_system);
       break;
     }
     fprintf(stdout, "[%s]E: %s otg mount fail(blk_device: %s, fs_type: %s): %s\n", kLogTag,
-            kOtgMounter, candidate, file_system, strerror(errno));
+            kOtgMounter, candidate.c_str(), file_system, strerror(errno));
   }
   return result;
 }
@@ -88,10 +85,10 @@ int mount_otg(const FstabEntry& row) {
     return -1;
   }
   int result = -1;
-  for (const char* candidate : has_ufs_storage() ? kOtgCandidatesUfs : kOtgCandidates) {
+  for (const std::string& candidate : otg_devices().current()) {
     if (!ZunoFunc::Path_Exists(candidate)) {
       fprintf(stdout, "[%s]I: %s block device(%s) is not exist.\n", kLogTag, kOtgMounter,
-              candidate);
+              candidate.c_str());
       continue;
     }
     result = try_otg_candidate(candidate, row);
