@@ -4,14 +4,13 @@
 #include <android-base/properties.h>
 #include <getopt.h>
 #include <stdio.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <optional>
 #include <string>
 
 #include "common/wipe.h"
 #include "device/zunogatekeeper/credential_store.h"
+#include "device/zunogatekeeper/password_input.h"
 
 namespace sentrova {
 namespace {
@@ -19,7 +18,6 @@ namespace {
 constexpr int kDone = 0;
 constexpr int kFailed = 1;
 constexpr int kUsageError = 2;
-constexpr size_t kMaxPasswordBytes = 1024;
 constexpr int kUserId = 0;
 // At r = 8 the table of 2^16 blocks is the largest that a reader accepts.
 constexpr int kHighestCost = 16;
@@ -76,30 +74,6 @@ bool parse_arguments(int argc, char** argv, Arguments& arguments) {
     return false;
   }
   return true;
-}
-
-// Reads the first line, without its end, into `password`. Returns false if it is empty, too long or
-// holds a NUL, or on a read error. Byte by byte: what follows the line stays unread, and no buffer
-// keeps a copy.
-bool read_password(int fd, std::string& password) {
-  password.reserve(kMaxPasswordBytes);  // or growth would leave copies behind
-  char byte = 0;
-  for (;;) {
-    const ssize_t length = read(fd, &byte, 1);
-    if (length < 0 && errno == EINTR) {
-      continue;
-    }
-    if (length < 0) {
-      return false;
-    }
-    if (length == 0 || byte == '\n') {
-      return !password.empty();
-    }
-    if (byte == '\0' || password.size() == kMaxPasswordBytes) {
-      return false;
-    }
-    password.push_back(byte);
-  }
 }
 
 // Fills in a fresh salt and the digest. Returns false where randomness or memory is not to be had.
