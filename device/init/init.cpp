@@ -32,6 +32,7 @@ const std::vector<ServiceDefinition>& service_table() {
   static const std::vector<ServiceDefinition> table = {
       {"servicemanager", {"/system/bin/servicemanager"}},
       {"rescue_host", {"/system/bin/rescue_host"}},
+      {"keystore2", {"/system/bin/keystore2"}, false},
   };
   return table;
 }
@@ -81,7 +82,9 @@ void leave_results(const Ending& ending) {
     PLOG(FATAL) << "cannot watch the properties";
   }
   for (const ServiceDefinition& service : service_table()) {
-    services.start(service.name);
+    if (service.starts_with_device) {
+      services.start(service.name);
+    }
   }
   const std::optional<Ending> ending = supervisor->run_until_end(start_main_program());
   if (!ending) {

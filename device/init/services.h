@@ -11,6 +11,7 @@ namespace sentrova::device {
 struct ServiceDefinition {
   std::string name;
   std::vector<std::string> arguments;
+  bool starts_with_device = true;  // false: only when it is asked for
 };
 
 // The long-running programs of the device. The state of each is told by the property
