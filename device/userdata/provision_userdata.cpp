@@ -22,6 +22,7 @@ constexpr int kUsageError = 2;
 
 constexpr char kHelp[] =
     "Usage: provision_userdata --kind KIND --file-system TYPE [--password] [--device PATH]\n"
+    "                          [--digest-file PATH]\n"
     "Makes user data with sample files on a partition, in place of all that was there, and prints\n"
     "the fstab that leads to it. The metadata partition must be mounted at /metadata.\n"
     "\n"
@@ -32,6 +33,9 @@ constexpr char kHelp[] =
     "  --file-system TYPE  f2fs or ext4\n"
     "  --password          the owner has a lock-screen password: one line of standard input\n"
     "  --device PATH       the partition (default: /dev/block/by-name/userdata)\n"
+    "  --digest-file PATH  where the digest of the photograph among the files goes, as sha256sum\n"
+    "                      takes it (default: /metadata/photograph.sha256); it holds the\n"
+    "                      photograph's path in plain text\n"
     "  --help              show this text\n"
     "\n"
     "Exit status: 0 done, 1 the user data could not be made, 2 wrong arguments or no usable\n"
@@ -46,10 +50,13 @@ struct Arguments {
 
 // Returns false if the arguments are not usable.
 bool parse_arguments(int argc, char** argv, Arguments& arguments) {
-  static const option kOptions[] = {
-      {"kind", required_argument, nullptr, 'k'}, {"file-system", required_argument, nullptr, 'f'},
-      {"password", no_argument, nullptr, 'p'},   {"device", required_argument, nullptr, 'd'},
-      {"help", no_argument, nullptr, 'h'},       {nullptr, 0, nullptr, 0}};
+  static const option kOptions[] = {{"kind", required_argument, nullptr, 'k'},
+                                    {"file-system", required_argument, nullptr, 'f'},
+                                    {"password", no_argument, nullptr, 'p'},
+                                    {"device", required_argument, nullptr, 'd'},
+                                    {"digest-file", required_argument, nullptr, 's'},
+                                    {"help", no_argument, nullptr, 'h'},
+                                    {nullptr, 0, nullptr, 0}};
   UserDataRequest& request = arguments.request;
   for (int found = 0; (found = getopt_long(argc, argv, "", kOptions, nullptr)) != -1;) {
     if (found == 'k') {
@@ -62,6 +69,8 @@ bool parse_arguments(int argc, char** argv, Arguments& arguments) {
       arguments.has_password = true;
     } else if (found == 'd') {
       request.block_device = optarg;
+    } else if (found == 's') {
+      request.digest_file = optarg;
     } else if (found == 'h') {
       arguments.help = true;
     } else {

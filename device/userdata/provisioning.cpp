@@ -155,7 +155,7 @@ class Provisioning {
     return (is_file_encrypted(request_.kind)
                 ? make_encrypted_storage(secret)
                 : make_folders(places_.de_folders()) && make_folders(places_.ce_folders(0))) &&
-           write_sample_files(places_, error_);
+           write_sample_files(places_, request_.digest_file, error_);
   }
 
   bool make_encrypted_storage(std::string_view secret) {

@@ -22,6 +22,8 @@ struct UserDataRequest {
   UserDataKind kind = UserDataKind::kPlain;
   std::string file_system;  // "f2fs" or "ext4"
   std::string block_device = "/dev/block/by-name/userdata";
+  // Where the photograph's digest and path go. They tell in plain text that there is one.
+  std::string digest_file = "/metadata/photograph.sha256";
 };
 
 // The fstab with which the rescue environment finds user data of this kind.

@@ -14,13 +14,12 @@ bool write(const std::string& path, const std::string& text, std::string& error)
 
 }  // namespace
 
-bool write_sample_files(const Places& places, std::string& error) {
+bool write_sample_files(const Places& places, const std::string& digest_file, std::string& error) {
   const std::string photograph = make_photograph();
   const std::string path = places.data + kPhotographFile;
   mkdir((places.data + "/media/0/DCIM").c_str(), 0755);  // what is wrong shows when it is used
   return write(path, photograph, error) &&
-         write(places.metadata + kPhotographDigestFile,
-               sha256_text(photograph) + "  " + path + "\n", error) &&
+         write(digest_file, sha256_text(photograph) + "  " + path + "\n", error) &&
          write(places.data + kMessagesFile, "Dinner at seven?\n", error) &&
          write(places.data + kAlarmsFile, "06:45 every day\n", error);
 }

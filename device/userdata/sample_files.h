@@ -10,11 +10,10 @@ namespace sentrova {
 inline constexpr char kPhotographFile[] = "/media/0/DCIM/lake.png";  // credential-encrypted
 inline constexpr char kMessagesFile[] = "/user/0/messages.txt";      // credential-encrypted
 inline constexpr char kAlarmsFile[] = "/user_de/0/alarms.txt";       // device-encrypted
-// Below the mount point of the metadata: the photograph's digest and path as sha256sum takes them.
-inline constexpr char kPhotographDigestFile[] = "/photograph.sha256";
 
-// Writes these files; their folders' storage is there and unlocked. False, with the reason in
-// `error`, where one cannot be written.
-bool write_sample_files(const Places& places, std::string& error);
+// Writes these files; their folders' storage is there and unlocked. The photograph's digest and
+// path are put into `digest_file` as sha256sum takes them. False, with the reason in `error`, where
+// a file cannot be written.
+bool write_sample_files(const Places& places, const std::string& digest_file, std::string& error);
 
 }  // namespace sentrova

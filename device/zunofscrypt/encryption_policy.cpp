@@ -1,5 +1,6 @@
 #include "device/zunofscrypt/encryption_policy.h"
 
+#include <android-base/errno_restorer.h>
 #include <android-base/unique_fd.h>
 #include <fcntl.h>
 #include <stddef.h>
@@ -12,13 +13,14 @@
 namespace sentrova {
 namespace {
 
-// Makes one request about a folder. `argument` is what the request asks for.
+// Makes one request about a folder, with what it asks for in `argument`. Keeps `errno`.
 bool request(const std::string& folder, unsigned long code, void* argument, const char* what,
              std::string& error) {
   const android::base::unique_fd fd(open(folder.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
   if (fd.ok() && ioctl(fd.get(), code, argument) == 0) {
     return true;
   }
+  const android::base::ErrnoRestorer keep_errno;
   error = folder + ": " + what + ": " + strerror(errno);
   return false;
 }
@@ -91,7 +93,7 @@ bool remove_key(const std::string& mount_point, const KeyIdentifier& identifier,
   fscrypt_remove_key_arg argument = {};
   argument.key_spec = specifier(identifier);
   if (!request(mount_point, FS_IOC_REMOVE_ENCRYPTION_KEY, &argument, "the key stays", error)) {
-    return false;
+    return errno == ENOKEY;  // there is none
   }
   if ((argument.removal_status_flags & FSCRYPT_KEY_REMOVAL_STATUS_FLAG_FILES_BUSY) != 0) {
     error = mount_point + ": files are busy";

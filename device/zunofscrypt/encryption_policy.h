@@ -34,8 +34,9 @@ std::optional<KeyIdentifier> add_key(const std::string& mount_point, const Maste
 std::optional<bool> has_key(const std::string& mount_point, const KeyIdentifier& identifier,
                             std::string& error);
 
-// Takes the key away. False also where files under it are still open, which then stay readable
-// until they are closed; the key goes with the last of them when this is called again.
+// Takes the key away; true also where it is not there. False also where files under it are still
+// open, which then stay readable until they are closed; the key goes with the last of them when
+// this is called again.
 bool remove_key(const std::string& mount_point, const KeyIdentifier& identifier,
                 std::string& error);
 

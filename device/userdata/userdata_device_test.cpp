@@ -1,0 +1,245 @@
+#include <android-base/file.h>
+#include <android-base/unique_fd.h>
+#include <fcntl.h>
+#include <fs_mgr.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sys/mount.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+#include "device/userdata/lock.h"
+#include "device/userdata/photograph.h"
+#include "device/userdata/provisioning.h"
+#include "device/userdata/sample_files.h"
+#include "device/zuno_vold/crypto_footer.h"
+#include "device/zunofscrypt/crypt_mapping.h"
+#include "device/zunofscrypt/key_file.h"
+#include "device/zunofscrypt/metadata_encryption.h"
+#include "device/zunofscrypt/user_storage.h"
+#include "tests/support/loop_device.h"
+
+namespace sentrova {
+namespace {
+
+using android::base::ReadFileToString;
+using android::base::unique_fd;
+using android::base::WriteStringToFile;
+using android::fs_mgr::Fstab;
+using android::fs_mgr::FstabEntry;
+using sentrova::testing::LoopDevice;
+using sentrova::testing::read_device;
+using ::testing::HasSubstr;
+
+constexpr int64_t kPartitionBytes = 64 << 20;
+constexpr char kSecret[] = "correct horse";
+
+// User data on a loop device.
+class UserData : public ::testing::Test {
+ protected:
+  ~UserData() override { close_user_data(places_, error_); }
+
+  // Also reads the fstab's row.
+  bool provision(UserDataKind kind) {
+    const UserDataRequest request = {kind, file_system_, partition_.path(), digest_file_.path};
+    const TemporaryFile fstab_file;
+    Fstab fstab;
+    if (!provision_user_data(places_, request, kSecret, error_) ||
+        !WriteStringToFile(fstab_text(places_, request), fstab_file.path) ||
+        !ReadFstabFromFile(fstab_file.path, &fstab) || fstab.size() != 2) {
+      return false;
+    }
+    row_ = fstab[1];
+    return true;
+  }
+
+  bool mount_device(const std::string& device) {
+    row_.blk_device = device;
+    return fs_mgr_do_mount_one(row_, places_.data) == FS_MGR_DOMNT_SUCCESS;
+  }
+
+  bool unlock_de() { return unlock_device_encrypted(places_, error_); }
+  bool unlock_ce(const std::string& secret) {
+    return unlock_credential_encrypted(places_, 0, secret, error_);
+  }
+  bool lock() { return lock_user_data(places_, error_); }
+
+  // The photograph's digest and path as sha256sum prints them; empty where it cannot be read.
+  std::string photograph() const {
+    const std::string path = places_.data + kPhotographFile;
+    std::string bytes;
+    return ReadFileToString(path, &bytes) ? sha256_text(bytes) + "  " + path + "\n" : "";
+  }
+  std::string recorded_photograph() const {
+    std::string line;
+    ReadFileToString(digest_file_.path, &line);
+    return line;
+  }
+  bool is_file_readable(const char* file) const {
+    return access((places_.data + file).c_str(), R_OK) == 0;
+  }
+
+  std::string mapping() {
+    return find_mapping(places_.mapping, error_).value_or("the kernel does not tell");
+  }
+
+  std::string file_system_ = "f2fs";
+  const LoopDevice partition_{kPartitionBytes};
+  const TemporaryDir metadata_;
+  const TemporaryDir data_;
+  const TemporaryFile digest_file_;
+  const Places places_ = {metadata_.path, data_.path, "userdata_test"};
+  FstabEntry row_;
+  std::string error_;
+};
+
+class UserDataOnBoth : public UserData, public ::testing::WithParamInterface<const char*> {
+ protected:
+  UserDataOnBoth() { file_system_ = GetParam(); }
+};
+
+INSTANTIATE_TEST_SUITE_P(FileSystems, UserDataOnBoth, ::testing::Values("f2fs", "ext4"));
+
+TEST_P(UserDataOnBoth, BehindMetadataEncryptionOpensStepByStepAndLocksAgain) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
+  EXPECT_NE(mount(partition_.path().c_str(), data_.path, GetParam(), 0, ""), 0);
+  for (int round = 0; round < 2; ++round) {
+    EXPECT_EQ(mapping(), "");
+    ASSERT_TRUE(unlock_metadata(places_, row_, error_)) << error_;
+    EXPECT_TRUE(unlock_metadata(places_, row_, error_)) << "again: " << error_;
+    EXPECT_FALSE(unlock_ce(kSecret)) << "too early";
+    EXPECT_THAT(error_, HasSubstr("the device-encrypted storage is locked"));
+    EXPECT_FALSE(is_file_readable(kAlarmsFile));
+    EXPECT_TRUE(unlock_de()) << error_;
+    EXPECT_TRUE(unlock_de()) << "again: " << error_;
+    EXPECT_TRUE(is_file_readable(kAlarmsFile));
+
+    EXPECT_FALSE(unlock_ce("wrong horse"));
+    EXPECT_FALSE(unlock_ce(kAbsentCredential));
+    EXPECT_EQ(photograph(), "");
+    EXPECT_TRUE(unlock_ce(kSecret)) << error_;
+    EXPECT_FALSE(unlock_ce("wrong horse")) << "it is open, but the secret is still wrong";
+    EXPECT_TRUE(unlock_ce(kSecret)) << error_;
+    EXPECT_EQ(photograph(), recorded_photograph());
+    EXPECT_NE(photograph(), "");
+    ASSERT_TRUE(lock()) << error_;
+  }
+  const std::string raw = read_device(partition_.path(), 0, kPartitionBytes);
+  EXPECT_EQ(raw.size(), size_t{kPartitionBytes});
+  EXPECT_EQ(raw.find(kPhotographComment), std::string::npos);
+}
+
+TEST_P(UserDataOnBoth, WhatIsInUseIsNotTakenAway) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
+  ASSERT_TRUE(unlock_metadata(places_, row_, error_) && unlock_de() && unlock_ce(kSecret));
+  unique_fd holder(open((places_.data + kPhotographFile).c_str(), O_RDONLY | O_CLOEXEC));
+  ASSERT_TRUE(holder.ok());
+  EXPECT_FALSE(lock());
+  EXPECT_THAT(error_, HasSubstr("files are busy"));
+  EXPECT_TRUE(unlock_ce(kSecret)) << "from halfway: " << error_;
+  EXPECT_FALSE(remove_mapping(places_.mapping, error_)) << "mounted";
+  EXPECT_EQ(errno, EBUSY);
+  EXPECT_FALSE(provision(UserDataKind::kPlain));
+  EXPECT_THAT(error_, HasSubstr("the user data is unlocked"));
+  EXPECT_EQ(photograph(), recorded_photograph());
+  holder.reset(open(places_.data.c_str(), O_RDONLY | O_CLOEXEC));
+  EXPECT_FALSE(lock());
+  EXPECT_THAT(error_, HasSubstr("cannot unmount"));
+  holder.reset();
+  EXPECT_TRUE(lock()) << "from halfway: " << error_;
+}
+
+// What may happen to a file with a key.
+enum class Damage { kMissing, kCutShort, kOneBit, kAnotherKey };
+
+bool damage_file(const std::string& path, Damage damage, const std::string& another) {
+  std::string bytes;
+  switch (damage) {
+    case Damage::kMissing:
+      return unlink(path.c_str()) == 0;
+    case Damage::kCutShort:
+      return truncate(path.c_str(), 31) == 0;
+    case Damage::kOneBit:
+      return ReadFileToString(path, &bytes) && (bytes.back() ^= 1, WriteStringToFile(bytes, path));
+    case Damage::kAnotherKey:
+      return ReadFileToString(another, &bytes) && WriteStringToFile(bytes, path);
+  }
+  return false;
+}
+
+TEST_F(UserData, MissingAndDamagedKeysFailWithTheirNameAndChangeNothing) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
+  const auto unlock = [this] {
+    return unlock_metadata(places_, row_, error_) && unlock_de() && unlock_ce(kSecret);
+  };
+  const std::string metadata_key = metadata_key_path(row_);
+  const struct {
+    std::string path;
+    std::string another;
+    bool mapped;
+  } keys[] = {{metadata_key, places_.device_secret(), false},
+              {places_.device_secret(), "/dev/null", false},
+              {places_.de_key(), metadata_key, true},
+              {places_.ce_key(0), places_.de_key(), true}};
+  for (const auto& [path, another, mapped] : keys) {
+    for (const Damage damage :
+         {Damage::kMissing, Damage::kCutShort, Damage::kOneBit, Damage::kAnotherKey}) {
+      SCOPED_TRACE(path + " " + std::to_string(static_cast<int>(damage)));
+      ASSERT_TRUE(unlock()) << error_;
+      std::string kept;
+      ASSERT_TRUE(ReadFileToString(path, &kept));
+      ASSERT_TRUE(damage_file(path, damage, another));
+      ASSERT_TRUE(lock()) << error_;
+
+      error_.clear();
+      EXPECT_FALSE(unlock());
+      EXPECT_NE(error_, "");
+      EXPECT_EQ(!mapping().empty(), mapped);
+      EXPECT_EQ(photograph(), "");
+
+      // The folder of this key may be reached with the others' keys alone.
+      ASSERT_TRUE(!mapped || unlock_de() || path == places_.de_key());
+      ASSERT_TRUE(replace_file(path, kept.data(), kept.size(), error_)) << error_;
+    }
+  }
+  EXPECT_TRUE(unlock());
+  EXPECT_EQ(photograph(), recorded_photograph());
+}
+
+TEST_F(UserData, AKeyOfOtherFoldersIsNotLeftInTheKernel) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncrypted)) << error_;
+  ASSERT_TRUE(mount_device(partition_.path()));
+  MasterKey other;
+  ASSERT_TRUE(fill_randomly(other.data(), MasterKey::size()));
+  const std::optional<KeyIdentifier> identifier = add_key(places_.data, other, error_);
+  ASSERT_TRUE(identifier && remove_key(places_.data, *identifier, error_)) << error_;
+
+  EXPECT_FALSE(unlock_folders(places_.data, places_.de_folders(), other, error_));
+  EXPECT_EQ(has_key(places_.data, *identifier, error_), false) << error_;
+  EXPECT_FALSE(is_file_readable(kAlarmsFile));
+  EXPECT_TRUE(unlock_de() && unlock_ce(kSecret)) << error_;
+  EXPECT_EQ(photograph(), recorded_photograph());
+}
+
+TEST_F(UserData, FullDiskEncryptionOpensWithTheKeyInTheFooter) {
+  file_system_ = "ext4";
+  ASSERT_TRUE(provision(UserDataKind::kFullDiskEncrypted)) << error_;
+  const int64_t footer = kPartitionBytes - static_cast<int64_t>(kFooterBytes);
+  const std::string kept = read_device(partition_.path(), footer, kFooterBytes);
+  ASSERT_TRUE(testing::write_device(partition_.path(), footer, std::string(64, 'x')));
+  EXPECT_FALSE(unlock_full_disk(places_.mapping, partition_.path(), error_));
+  EXPECT_THAT(error_, HasSubstr("not a wrapped key"));
+  EXPECT_EQ(mapping(), "");
+
+  ASSERT_TRUE(testing::write_device(partition_.path(), footer, kept));
+  ASSERT_TRUE(unlock_full_disk(places_.mapping, partition_.path(), error_)) << error_;
+  EXPECT_TRUE(unlock_full_disk(places_.mapping, partition_.path(), error_)) << "again: " << error_;
+  ASSERT_TRUE(mount_device(mapping()));
+  EXPECT_EQ(photograph(), recorded_photograph());
+  EXPECT_TRUE(lock()) << error_;
+  EXPECT_EQ(read_device(partition_.path(), footer, kFooterBytes), kept);
+}
+
+}  // namespace
+}  // namespace sentrova
