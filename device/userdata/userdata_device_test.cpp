@@ -8,6 +8,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <filesystem>
 
 #include "device/userdata/lock.h"
 #include "device/userdata/photograph.h"
@@ -220,6 +221,30 @@ TEST_F(UserData, AKeyOfOtherFoldersIsNotLeftInTheKernel) {
   EXPECT_FALSE(is_file_readable(kAlarmsFile));
   EXPECT_TRUE(unlock_de() && unlock_ce(kSecret)) << error_;
   EXPECT_EQ(photograph(), recorded_photograph());
+}
+
+TEST_F(UserData, AMissingFolderKeepsNoOtherLockedButOneUnderAnotherKeyDoes) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncrypted)) << error_;
+  ASSERT_TRUE(mount_device(partition_.path()) && unlock_de() && unlock_ce(kSecret)) << error_;
+  const std::string folder = places_.ce_folders(0)[1];
+  const std::optional<KeyIdentifier> de = read_policy(places_.de_folders()[0], error_);
+  ASSERT_TRUE(de && std::filesystem::remove_all(folder) > 0) << error_;
+  ASSERT_TRUE(lock() && mount_device(partition_.path()) && unlock_de()) << error_;
+  EXPECT_TRUE(unlock_ce(kSecret)) << error_;
+  EXPECT_EQ(photograph(), recorded_photograph());
+
+  ASSERT_TRUE(std::filesystem::create_directory(folder) && set_policy(folder, *de, error_));
+  EXPECT_FALSE(unlock_ce(kSecret));
+  EXPECT_THAT(error_, HasSubstr(folder + ": encrypted under another key"));
+}
+
+TEST_F(UserData, AMappingThatWasLeftHalfMadeIsMadeAnew) {
+  ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
+  setenv("DM_DISABLE_UDEV", "1", 1);
+  ASSERT_EQ(testing::run_program({"/system/bin/dmsetup", "create", "--notable", places_.mapping}),
+            0);
+  EXPECT_TRUE(unlock_metadata(places_, row_, error_)) << error_;
+  EXPECT_NE(mapping(), "");
 }
 
 TEST_F(UserData, FullDiskEncryptionOpensWithTheKeyInTheFooter) {
