@@ -4,10 +4,13 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <optional>
+#include <string>
 
 #include "service/sentrova_service.h"
 #include "tests/support/allocation_count.h"
 #include "tests/support/fake_credential_library.h"
+#include "tests/support/fake_decryption_library.h"
 
 namespace {
 
@@ -33,6 +36,22 @@ TEST(LocalTransaction, AllocatesOnlyTheStringsOfItsArguments) {
   EXPECT_EQ(allocations_of(2, "short"), 2u);
   // Also the operation's argument and the copy that the credential library gets.
   EXPECT_EQ(allocations_of(2, "a password longer than a short string"), 4u);
+  EXPECT_EQ(allocations_of(6, "a password longer than a short string"), 4u);
+}
+
+TEST(UnlockWithAPassword, HandsOutItsOnlyCopyAndWipesIt) {
+  FakeCredentialLibrary::instance().recording = false;
+  FakeCredentialLibrary::instance().matches = [](const std::string&) { return true; };
+  std::optional<sentrova::FreedBlock> handed_out;
+  FakeDecryptionLibrary::instance().user = [&](int, const std::string& secret, bool) {
+    handed_out.emplace(secret.data());
+    return true;
+  };
+  EXPECT_EQ(android::sp(new android::SentrovaService())
+                ->fbeDecryptUserCe(0, std::string(1000, 'x'), false),
+            0);
+  ASSERT_TRUE(handed_out);
+  EXPECT_EQ(handed_out->state(), sentrova::FreedBlock::kWiped);
 }
 
 }  // namespace

@@ -11,6 +11,7 @@ struct FakeCredentialLibrary {
   int lock_status = 0;
   std::function<bool(const std::string&)> matches = [](const std::string&) { return false; };
   bool recording = true;
+  std::function<void(const std::string& call)> on_call = [](const auto&) {};  // while recording
 
   std::vector<std::string> calls;  // "manager 0", "status", "verify TEXT", "storage gone 2"
   bool storage_was_zero = false;   // of the manager made last, when its constructor began
@@ -22,6 +23,7 @@ struct FakeCredentialLibrary {
   void record(const char* call, const std::string& detail = "") {
     if (recording) {
       calls.push_back(call + detail);
+      on_call(calls.back());
     }
   }
 };
