@@ -1,17 +1,28 @@
 #include <CLI/CLI.hpp>
 #include <cstdio>
 #include <exception>
+#include <string>
 
 #include "cli/credential_commands.h"
 #include "cli/exit_status.h"
 #include "cli/output.h"
+#include "cli/status_command.h"
+#include "cli/unlock_command.h"
 
 namespace {
 
-constexpr char kDescription[] = "Asks the rescue service of this device about the owner's data.";
+constexpr char kDescription[] =
+    "Asks the rescue service of this device about the owner's data and has it unlocked.";
 constexpr char kExitStatusHelp[] =
     "Exit status: 0 done, or yes; 1 no (the password is wrong); 2 the command line or the input\n"
-    "cannot be used; 3 the service was not reached or died; 4 the service could not do it.";
+    "cannot be used; 3 the service was not reached or died; 4 the service could not do it.\n"
+    "A password is asked for without echo on a terminal; otherwise it is the first line of\n"
+    "standard input.";
+constexpr char kUnlockHelp[] =
+    "Unlock the data step by step, asking for the password where one is set (three tries on a "
+    "terminal, one otherwise), and show what is readable then";
+constexpr char kMethodHelp[] =
+    "How the data is encrypted: fbe by file, fde the whole disk, auto as the device says";
 
 int run(int argc, char** argv) {
   CLI::App app(kDescription, "sentrova");
@@ -28,10 +39,20 @@ int run(int argc, char** argv) {
   app.add_subcommand("password-type", "Show what kind of credential locks the data")->callback([&] {
     status = sentrova::show_password_type(user_id, output);
   });
-  app.add_subcommand("verify",
-                     "Check a password: asked for without echo on a terminal, otherwise the first "
-                     "line of standard input")
-      ->callback([&] { status = sentrova::verify_password(user_id, output); });
+  app.add_subcommand("verify", "Check a password")->callback([&] {
+    status = sentrova::verify_password(user_id, output);
+  });
+  app.add_subcommand("status",
+                     "Show the credential type, the encryption, the last unlock's result and what "
+                     "is mounted at /data")
+      ->callback([&] { status = sentrova::show_status(user_id, output); });
+  std::string method = sentrova::kMethodAuto;
+  CLI::App* unlock = app.add_subcommand("unlock", kUnlockHelp);
+  unlock->add_option("--method", method, kMethodHelp)
+      ->check(CLI::IsMember(
+          {sentrova::kMethodAuto, sentrova::kMethodFileBased, sentrova::kMethodFullDisk}))
+      ->capture_default_str();
+  unlock->callback([&] { status = sentrova::unlock_data(user_id, method, output); });
 
   try {
     app.parse(argc, argv);

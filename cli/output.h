@@ -12,7 +12,11 @@ class Output {
   explicit Output(const bool& json) : json_(json) {}
 
   void result(const std::string& text, const nlohmann::json& object) const;
+  // `object` is what else the JSON object holds.
   void error(const std::string& text) const;
+  void error(const std::string& text, const nlohmann::json& object) const;
+  // Text that is written at once, as it stands, for people only.
+  void progress(const std::string& text) const;
 
  private:
   const bool& json_;  // the command line's flag, which is parsed later
