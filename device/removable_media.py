@@ -1,9 +1,8 @@
 """Disks that the host plugs into the virtual device and pulls out again while it runs.
 
 A story names the ports that it needs in a line of its own, `# devices: usb sd`; without it the
-device has neither, and starts a bit sooner. It asks by creating an empty file /share/requests/NAME
-(see stories/lib/host.sh), NAME being a key of REQUESTS. The host carries the request out and then
-removes the file; where it cannot, it renames it to NAME.failed, with the reason in it.
+device has neither, and starts a bit sooner. Its requests (see host_requests.py) are the names in
+`actions`.
 
 Each disk is new at every start: one empty partition, which bears the disk's name in its GPT.
 """
@@ -13,6 +12,8 @@ from __future__ import annotations
 import subprocess
 from collections.abc import Callable, Iterable
 from pathlib import Path
+
+from device.host_requests import Action
 
 KINDS = ("usb", "sd")
 
@@ -26,14 +27,16 @@ SD_BUS = "/gpex-pcihost/pcie.0/sd1/sd-bus"
 
 Qmp = Callable[..., object]
 
-REQUESTS: dict[str, Callable[[Path, Qmp], object]] = {
-    "plug_usb": lambda folder, qmp: qmp(
-        "device_add", driver="usb-storage", id="stick", bus="xhci.0", drive=USB_MEDIUM),
-    "unplug_usb": lambda folder, qmp: qmp("device_del", id="stick"),
-    "insert_sd": lambda folder, qmp: qmp(
-        "blockdev-change-medium", id=SD_CARD, filename=str(folder / "sd.img"), format="raw"),
-    "eject_sd": lambda folder, qmp: qmp("eject", id=SD_CARD, force=True),
-}
+def actions(folder: Path, qmp: Qmp) -> dict[str, Action]:
+    """What can be asked for; the disks are in `folder`."""
+    return {
+        "plug_usb": lambda _: qmp(
+            "device_add", driver="usb-storage", id="stick", bus="xhci.0", drive=USB_MEDIUM),
+        "unplug_usb": lambda _: qmp("device_del", id="stick"),
+        "insert_sd": lambda _: qmp(
+            "blockdev-change-medium", id=SD_CARD, filename=str(folder / "sd.img"), format="raw"),
+        "eject_sd": lambda _: qmp("eject", id=SD_CARD, force=True),
+    }
 
 
 def wanted_kinds(story: str) -> list[str]:
@@ -72,18 +75,3 @@ def qemu_arguments(folder: Path, kinds: Iterable[str]) -> list[str]:
         arguments += ["-drive", "if=none,id=sd-medium"]
         arguments += ["-device", f"sd-card,id={SD_CARD},drive=sd-medium,bus={SD_BUS}"]
     return arguments
-
-
-def serve_requests(requests: Path, folder: Path, qmp: Qmp) -> None:
-    """Carries out the requests that are waiting in the folder `requests`."""
-    for request in sorted(requests.iterdir()):
-        if request.suffix == ".failed":
-            continue
-        try:
-            if request.name not in REQUESTS:
-                raise ValueError(f"there is no request {request.name}")
-            REQUESTS[request.name](folder, qmp)
-            request.unlink()
-        except (OSError, RuntimeError, ValueError) as error:
-            request.write_text(f"{error}\n")
-            request.rename(f"{request}.failed")

@@ -4,13 +4,15 @@ The host and the device share a temporary folder, /share on the device. The host
 there; the device's init leaves the output, the logs and, last of all, the result (see
 init/init.cpp). A run without a result has failed, whatever QEMU says: a kernel that panics ends
 QEMU with status 0.
+
+Each run has a copy of its disk to itself. A story may have the power cut (see
+stories/power_cuts.story): the device then starts again on the same disk and runs the story from its
+beginning. /share/boot holds the number of the start, from 1.
 """
 
 from __future__ import annotations
 
-import json
 import shutil
-import socket
 import subprocess
 import tempfile
 import time
@@ -18,11 +20,13 @@ from collections.abc import Callable, Iterable
 from dataclasses import dataclass, field
 from pathlib import Path
 
-from device import removable_media
+from device import host_requests, qmp, removable_media
 
 ROOT = Path(__file__).resolve().parent.parent
 IMAGE = ROOT / "build/image"
 DEVICE_BUILD = ROOT / "build/device"
+INITRAMFS = DEVICE_BUILD / "device/initramfs"
+EMPTY_DISK = IMAGE / "disk/disk.img"
 STORIES = ROOT / "device/stories"
 
 KERNEL_ARGUMENTS = [
@@ -57,6 +61,12 @@ def stories() -> list[Story]:
     return [Story(path) for path in sorted(STORIES.glob("*.story"))]
 
 
+def copy_disk(source: Path, target: Path) -> None:
+    """Copies a disk's image, without its holes."""
+    copy = ["cp", "--sparse=always", "--reflink=auto", str(source), str(target)]
+    subprocess.run(copy, check=True)
+
+
 @dataclass
 class Outcome:
     """How a run of the device ended."""
@@ -64,8 +74,8 @@ class Outcome:
     status: int | None  # the story's exit status; None: the device left no result
     power_request: str | None  # the "sys.powerctl" request that ended the run
     problem: str  # why there is no result, in words; empty when there is one
-    seconds: float  # from QEMU's start to its end
-    first_answer_seconds: float | None  # from QEMU's start to the first answered transaction
+    seconds: float  # from the first start of QEMU to its last end
+    moments: dict[str, float]  # what the story noted, by name: seconds from QEMU's start
     log: str  # the story's output
 
 
@@ -74,21 +84,24 @@ class Device:
     """One run of the virtual device; a context manager, which ends QEMU and removes the folders."""
 
     kernel_arguments: list[str] = field(default_factory=list)
-    initramfs: Path = DEVICE_BUILD / "device/initramfs"
+    base_disk: Path = EMPTY_DISK
+    disk_facts: Path | None = None  # a folder that tells about the disk: /share/disk on the device
 
     def __enter__(self) -> Device:
         self._folder = Path(tempfile.mkdtemp(prefix="sentrova-device-"))
         self.share = self._folder / "share"
+        self.disk = self._folder / "disk.img"
         self._requests = self.share / "requests"
-        self._requests.mkdir(parents=True)
+        self._moments: dict[str, float] = {}
+        for folder in (self._requests, self.share / "moments"):
+            folder.mkdir(parents=True)
         self._media: list[str] = []
+        self._boots = 0
         self._process: subprocess.Popen[bytes] | None = None
         return self
 
     def __exit__(self, *_: object) -> None:
-        if self._process is not None and self._process.poll() is None:
-            self._process.kill()
-            self._process.wait()
+        self._cut_power()
         shutil.rmtree(self._folder)
 
     def run_story(
@@ -96,39 +109,36 @@ class Device:
     ) -> Outcome:
         """Boots, runs the story and waits for the end; `on_output` gets its output as it comes."""
         shutil.copy(story, self.share / "story")
+        self._prepare_disk()
         self._prepare_media(removable_media.wanted_kinds(story.read_text()))
         for part in (STORIES / "lib").iterdir():
             shutil.copy(part, self.share)
         started = time.monotonic()
-        self._start(["-serial", f"file:{self._folder}/console.txt"])
-        assert self._process is not None
+        self._boot()
 
-        first_answer: float | None = None
         shown = 0
         timed_out = False
         running = True
         while running:
-            running = self._process.poll() is None
-            elapsed = time.monotonic() - started
-            if first_answer is None and (self.share / "first_answer").exists():
-                first_answer = elapsed
+            running = self._is_running()
+            self._note_moments()
             if on_output is not None:
                 shown = self._show_new_output(shown, on_output)
             if running:
-                removable_media.serve_requests(self._requests, self._folder, self.qmp)
-            if running and elapsed > timeout_seconds:
+                host_requests.serve(self._requests, self._actions())
+            if running and time.monotonic() - started > timeout_seconds:
                 timed_out = True
-                print(f"device: no end after {timeout_seconds} s; it is {self.qmp_status()}")
-                self._process.kill()
-                self._process.wait()
+                print(f"device: no end after {timeout_seconds} s; it is {self._machine_status()}")
+                self._cut_power()
                 running = False
             if running:
                 time.sleep(POLL_SECONDS)
-        return self._outcome(time.monotonic() - started, first_answer, timed_out)
+        return self._outcome(time.monotonic() - started, timed_out)
 
     def run_console(self) -> int:
         """Boots with a shell on this terminal and waits for its end; returns its exit status."""
         self.kernel_arguments = [*self.kernel_arguments, "prop.ro.boot.console=1"]
+        self._prepare_disk()
         self._prepare_media(removable_media.KINDS)
         self._start(["-serial", "mon:stdio"], interactive=True)
         assert self._process is not None
@@ -136,27 +146,44 @@ class Device:
         result = self._read("result")
         return int(result) if result is not None else 1
 
-    def qmp(self, command: str, **arguments: object) -> object:
-        """Carries out a command of QEMU's machine protocol; raises RuntimeError when it fails."""
-        with socket.socket(socket.AF_UNIX) as connection:
-            connection.settimeout(5)
-            connection.connect(str(self._folder / "qmp"))
-            with connection.makefile("rw") as stream:
-                stream.readline()  # the greeting
-                for name, words in (("qmp_capabilities", {}), (command, arguments)):
-                    stream.write(json.dumps({"execute": name, "arguments": words}) + "\n")
-                    stream.flush()
-                    answer = json.loads(stream.readline())
-                    while "event" in answer:
-                        answer = json.loads(stream.readline())
-                    if "error" in answer:
-                        raise RuntimeError(f"{name}: {answer['error']['desc']}")
-        return answer["return"]
+    def _boot(self) -> None:
+        self._boots += 1
+        (self.share / "boot").write_text(f"{self._boots}\n")
+        self._boot_started = time.monotonic()
+        self._start(["-serial", f"file:{self._folder}/console.txt"])
 
-    def qmp_status(self) -> str:
+    def _is_running(self) -> bool:
+        return self._process is not None and self._process.poll() is None
+
+    def _cut_power(self) -> None:
+        if self._process is not None and self._process.poll() is None:
+            self._process.kill()
+            self._process.wait()
+
+    def _restart_after(self, milliseconds: str) -> None:
+        time.sleep(int(milliseconds) / 1000)
+        self._cut_power()
+        self._boot()
+
+    def _note_moments(self) -> None:
+        for moment in (self.share / "moments").iterdir():
+            self._moments.setdefault(moment.name, time.monotonic() - self._boot_started)
+
+    def _actions(self) -> dict[str, host_requests.Action]:
+        return {
+            **removable_media.actions(self._folder, self._qmp),
+            "cut_power": self._restart_after,
+            "find_on_disk": lambda partition: host_requests.find_on_disk(
+                self.disk, partition, (self.share / "needle").read_bytes()),
+        }
+
+    def _qmp(self, command: str, **arguments: object) -> object:
+        return qmp.execute(self._folder / "qmp", command, **arguments)
+
+    def _machine_status(self) -> str:
         """What QEMU says about the machine, as "running"."""
         try:
-            status = self.qmp("query-status")
+            status = self._qmp("query-status")
         except (OSError, RuntimeError, ValueError) as error:
             return f"not to be asked ({error})"
         return str(status["status"]) if isinstance(status, dict) else "unknown"
@@ -180,17 +207,21 @@ class Device:
         command = ["qemu-system-aarch64", *machine]
         # One virtual processor: with more, wake-ups between them stall under emulation.
         command += ["-accel", "tcg,thread=multi", "-nodefaults", "-display", "none", "-no-reboot"]
-        command += ["-kernel", str(IMAGE / "kernel/vmlinuz"), "-initrd", str(self.initramfs)]
+        command += ["-kernel", str(IMAGE / "kernel/vmlinuz"), "-initrd", str(INITRAMFS)]
         command += ["-dtb", str(IMAGE / "machine/device.dtb")]
         command += ["-append", " ".join([*KERNEL_ARGUMENTS, *self.kernel_arguments])]
         command += self._shared_folder("share", self.share, read_only=False)
         command += self._shared_folder("build", DEVICE_BUILD, read_only=True)
-        # Writes go to a throw-away layer, so that no run sees another's.
-        disk = IMAGE / "disk/disk.img"
-        command += ["-drive", f"file={disk},if=none,id=disk,format=raw,snapshot=on"]
+        # What the device has flushed is kept when QEMU is killed; this machine's own end is no case.
+        command += ["-drive", f"file={self.disk},if=none,id=disk,format=raw,cache=unsafe"]
         command += ["-device", "virtio-blk-pci,drive=disk"]
         command += removable_media.qemu_arguments(self._folder, self._media)
         return command + ["-qmp", f"unix:{self._folder}/qmp,server=on,wait=off"]
+
+    def _prepare_disk(self) -> None:
+        copy_disk(self.base_disk, self.disk)
+        if self.disk_facts is not None:
+            shutil.copytree(self.disk_facts, self.share / "disk")
 
     def _prepare_media(self, kinds: Iterable[str]) -> None:
         self._media = list(kinds)
@@ -225,7 +256,7 @@ class Device:
             on_output(new.decode(errors="replace"))
         return shown + len(new)
 
-    def _outcome(self, seconds: float, first_answer: float | None, timed_out: bool) -> Outcome:
+    def _outcome(self, seconds: float, timed_out: bool) -> Outcome:
         result, power_request = self._read("result"), self._read("powerctl")
         problem = ""
         if timed_out:
@@ -236,7 +267,7 @@ class Device:
             problem += self._last_words()
         status = int(result) if result is not None and not timed_out else None
         log = self._read("log.txt") or ""
-        return Outcome(status, power_request, problem, seconds, first_answer, log)
+        return Outcome(status, power_request, problem, seconds, self._moments, log)
 
     def _last_words(self) -> str:
         """The ends of the console and of QEMU's messages, for a run that failed."""

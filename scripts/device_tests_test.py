@@ -16,7 +16,7 @@ class CountStory(unittest.TestCase):
             (127, "sh: not found", (0, 1)),
             (None, "3 passed, 0 failed", (0, 1)),  # the device died
         ):
-            outcome = Outcome(status, None, "", 1.0, None, log)
+            outcome = Outcome(status, None, "", 1.0, {}, log)
             tally = count_story("s", outcome)
             self.assertEqual((tally.passed, tally.failed), expected, (status, log))
             self.assertEqual(bool(tally.failures), tally.failed > 0)

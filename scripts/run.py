@@ -7,11 +7,12 @@ import signal
 import sys
 import time
 
-from device import vm
+from device import disk_kinds, vm
 from scripts import building
 
 DEFAULT_STORY = "ground_floor"
-STORY_TIMEOUT_SECONDS = 120
+CONSOLE_DISK = "fbe_metadata_password"
+STORY_TIMEOUT_SECONDS = 240
 
 
 def parse_arguments() -> argparse.Namespace:
@@ -35,8 +36,9 @@ def parse_arguments() -> argparse.Namespace:
 
 
 def list_stories() -> int:
+    width = max(len(story.name) for story in vm.stories())
     for story in vm.stories():
-        print(f"{story.name:<16} {story.description}")
+        print(f"{story.name:<{width}} {story.description}")
     return 0
 
 
@@ -48,16 +50,16 @@ def find_story(name: str) -> vm.Story:
     sys.exit(2)
 
 
-def run_story(story: vm.Story) -> int:
+def run_story(story: vm.Story, new_device: vm.Device) -> int:
     print(f"\n{story.description}\n", flush=True)
-    with vm.Device() as device:
+    with new_device as device:
         outcome = device.run_story(
             story.path, STORY_TIMEOUT_SECONDS, lambda text: print(text, end="", flush=True)
         )
         device.keep_logs(building.BUILD / "logs" / story.name)
     print()
-    if outcome.first_answer_seconds is not None:
-        print(f"from power-on to the first answered call: {outcome.first_answer_seconds:.1f} s")
+    for moment, seconds in outcome.moments.items():
+        print(f"from power-on to {moment}: {seconds:.1f} s")
     print(f"from power-on to power-off: {outcome.seconds:.1f} s")
     print(f"logs: build/logs/{story.name}")
     if outcome.problem:
@@ -65,9 +67,9 @@ def run_story(story: vm.Story) -> int:
     return 0 if outcome.status == 0 else 1
 
 
-def run_shell() -> int:
-    print("\nthe device's console; `exit` powers it off\n", flush=True)
-    with vm.Device() as device:
+def run_shell(new_device: vm.Device) -> int:
+    print(f"\nthe device's console, with the disk {CONSOLE_DISK}; `exit` powers it off\n", flush=True)
+    with new_device as device:
         return device.run_console()
 
 
@@ -82,11 +84,16 @@ def main() -> int:
         with building.build_lock():
             building.build_image()
             building.build_preset("device", "initramfs")
-    except building.StepFailed as failure:
+            device = (
+                disk_kinds.device_with(CONSOLE_DISK)
+                if arguments.shell
+                else disk_kinds.device_for(story.path)
+            )
+    except (building.StepFailed, disk_kinds.ProvisioningFailed) as failure:
         print(failure, file=sys.stderr)
         return 1
     print(f"ready after {time.monotonic() - started:.1f} s", flush=True)
-    return run_shell() if arguments.shell else run_story(story)
+    return run_shell(device) if arguments.shell else run_story(story, device)
 
 
 if __name__ == "__main__":

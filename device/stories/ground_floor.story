@@ -8,7 +8,7 @@ step_with_input "The owner sets a password" "$password" provision_credential --s
 expect_status 0
 
 step "What locks the data?" sentrova password-type
-[ "$status" -ne 0 ] || note_first_answer
+[ "$status" -ne 0 ] || note_moment "first answered call"
 expect_status 0
 expect_output "a credential is set (type 2)"
 

@@ -1,11 +1,12 @@
-# Words for stories in which disks are plugged in and pulled out; the host does that (see
-# device/removable_media.py).
+# Words for stories that need something of the host, as disks to be plugged in and pulled out (see
+# device/host_requests.py and device/removable_media.py).
 
 volumes_log=/tmp/volumes.log
 
-# ask_host REQUEST: status 1, with the reason, if the host cannot or does not answer.
+# ask_host REQUEST [ARGUMENT]: status 1, with the reason, if the host cannot or does not answer.
 ask_host() {
-  : >"/share/requests/$1"
+  rm -f "/share/requests/$1.failed"
+  printf %s "${2-}" >/share/request && mv /share/request "/share/requests/$1"
   wait_for 10 absent "/share/requests/$1" || {
     echo "no answer from the host"
     return 1
@@ -14,6 +15,14 @@ ask_host() {
     cat "/share/requests/$1.failed"
     return 1
   }
+}
+
+# cut_power_after MILLISECONDS: returns at once. The device then starts anew and runs the story from
+# its beginning; the counts go on.
+cut_power_after() {
+  echo "$passed $failed" >/share/counts
+  echo "* The power is cut after $1 ms"
+  printf %s "$1" >/share/request && mv /share/request /share/requests/cut_power
 }
 
 present() { [ -e "$1" ]; }

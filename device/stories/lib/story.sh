@@ -3,6 +3,8 @@
 
 passed=0
 failed=0
+# The counts of the starts before this one.
+[ ! -e /share/counts ] || read -r passed failed </share/counts
 status=0
 output=
 
@@ -68,6 +70,9 @@ lacks() { [ -r "$1" ] && ! grep -qF -- "$2" "$1"; }
 # expect_file_lacks FILE TEXT: the file is there and does not hold the text.
 expect_file_lacks() { check "expected $1 without: $2" lacks "$1" "$2"; }
 
+# expect_file_has FILE TEXT
+expect_file_has() { check "expected $1 with: $2" grep -qF -- "$2" "$1"; }
+
 # wait_for SECONDS COMMAND...: runs the command until it succeeds; status 1 after so many seconds.
 wait_for() {
   wait_end=$(($(now) + $1 * 100))
@@ -80,8 +85,8 @@ wait_for() {
 
 service_is() { [ "$(getprop "init.svc.$1")" = "$2" ]; }
 
-# Tells the host that a transaction has been answered; it measures the time from power-on to here.
-note_first_answer() { : >/share/first_answer; }
+# note_moment NAME: tells the host, which measures the time from power-on to here.
+note_moment() { : >"/share/moments/$1"; }
 
 finish() {
   echo "$passed passed, $failed failed"
