@@ -11,6 +11,7 @@
 
 #include "device/init/block_links.h"
 #include "device/init/boot_properties.h"
+#include "device/init/early_mounts.h"
 #include "device/init/file_systems.h"
 #include "device/init/modules.h"
 #include "device/init/process.h"
@@ -49,6 +50,7 @@ void bring_up() {
   }
   seed_properties();
   link_partitions("/sys/class/block", "/dev/block/by-name");
+  mount_early_volumes();
 }
 
 pid_t start_main_program() {

@@ -218,9 +218,9 @@ std::optional<UserDataKind> parse_kind(std::string_view name) {
 }
 
 std::string fstab_text(const Places& places, const UserDataRequest& request) {
-  std::string text = "/dev/block/by-name/metadata " + places.metadata + " ext4 noatime wait\n" +
-                     request.block_device + " " + places.data + " " + request.file_system +
-                     " noatime ";
+  std::string text = "/dev/block/by-name/metadata " + places.metadata +
+                     " ext4 noatime wait,first_stage_mount\n" + request.block_device + " " +
+                     places.data + " " + request.file_system + " noatime ";
   for (const KindRow& row : kKinds) {
     if (row.kind == request.kind) {
       text += row.options;
