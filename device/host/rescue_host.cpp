@@ -1,5 +1,5 @@
-// The loading program of the rescue service: it publishes one service object under its name and
-// serves calls until it is killed.
+// The loading program of the rescue service: it loads the volume table, publishes one service
+// object under its name and serves calls until it is killed.
 
 #include <android-base/logging.h>
 #include <binder/IPCThreadState.h>
@@ -11,7 +11,8 @@
 #include <cstdio>
 #include <cstring>
 
-#include "service/sentrova_service.h"
+#include "device/host/timed_service.h"
+#include "recovery_utils/roots.h"
 
 namespace {
 
@@ -31,7 +32,7 @@ class Publisher : public android::IBinder::DeathRecipient {
   }
 
  private:
-  const android::sp<android::SentrovaService> service_ = new android::SentrovaService();
+  const android::sp<android::SentrovaService> service_ = new sentrova::device::TimedService();
 };
 
 bool Publisher::publish() {
@@ -57,6 +58,8 @@ int main(int, char** argv) {
   android::base::InitLogging(argv, android::base::StderrLogger);
   // The service tells its steps on standard output; a log file must show them as they happen.
   setvbuf(stdout, nullptr, _IOLBF, 0);
+  // Before the service is there: nothing guards the table.
+  load_volume_table();
   const android::sp<Publisher> publisher = new Publisher();
   if (!publisher->publish()) {
     return 1;
