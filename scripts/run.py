@@ -10,7 +10,7 @@ import time
 from device import disk_kinds, vm
 from scripts import building
 
-DEFAULT_STORY = "ground_floor"
+DEFAULT_STORY = "unlock_metadata"
 CONSOLE_DISK = "fbe_metadata_password"
 STORY_TIMEOUT_SECONDS = 240
 
