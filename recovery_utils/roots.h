@@ -66,3 +66,31 @@ SENTROVA_API int ensure_path_unmounted(const std::string& path);
 // volumes but "/", "/sdcard" and "/otg", in the table's order. Returns 0, or -1 at the first row
 // that fails, with the rows before it as they were set, or if the table is empty.
 SENTROVA_API int setup_install_mounts();
+
+// Makes a fresh file system, ext4 or f2fs, on the volume whose mount point is exactly `volume`:
+// everything on it is lost. Unmounts the volume first, killing the processes that hold it if need
+// be; wipes its key device if its row names one by path; then runs the platform's tools, at most
+// two, and waits for them. The row's negative length, or a key in the footer, keeps the end of the
+// device free. If `directory` is not empty, the new file system is filled from it.
+//
+// /data may lie behind the device-mapper device "userdata" ("ro.crypto.state", "ro.crypto.type",
+// "ro.crypto.metadata.enabled"). That is formatted in place with its key kept, or reverted first
+// and the partition formatted: always with metadata encryption or an armed data dump (datadump.h),
+// where the mapping is not to be found, and when the caller sets `revert_userdata`. The flag is set
+// when the function decides for it, and never cleared. While a dump is armed the file system takes
+// the first 8 GiB, and the dump's offset is cleared afterwards. /data also follows the properties
+// "external_storage.projid.enabled" and "external_storage.casefold.enabled" (f2fs only).
+//
+// Returns 0 when formatted, although the revert or the clearing of the dump's offset may have
+// failed and a tool that was killed by a signal is not noticed but in the log. Returns -1 after an
+// error in the base log: before anything has changed if no row, or a ramdisk's, or one with another
+// mount point or kind of file system serves the path (of these, the last is unmounted) or it stays
+// mounted; later if the key device or the device cannot be opened, the device is no larger than its
+// reserved end, or a tool fails. Nothing is undone then.
+SENTROVA_API int format_volume(const std::string& volume, const std::string& directory,
+                               bool& revert_userdata);
+
+// The same with an empty directory, with a flag that starts out false, or with both.
+SENTROVA_API int format_volume(const std::string& volume);
+SENTROVA_API int format_volume(const std::string& volume, bool& revert_userdata);
+SENTROVA_API int format_volume(const std::string& volume, const std::string& directory);
