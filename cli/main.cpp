@@ -6,6 +6,7 @@
 #include "cli/credential_commands.h"
 #include "cli/exit_status.h"
 #include "cli/output.h"
+#include "cli/power_commands.h"
 #include "cli/status_command.h"
 #include "cli/unlock_command.h"
 
@@ -53,6 +54,7 @@ int run(int argc, char** argv) {
           {sentrova::kMethodAuto, sentrova::kMethodFileBased, sentrova::kMethodFullDisk}))
       ->capture_default_str();
   unlock->callback([&] { status = sentrova::unlock_data(user_id, method, output); });
+  sentrova::add_power_commands(app, output, status);
 
   try {
     app.parse(argc, argv);

@@ -3,7 +3,8 @@
 The host and the device share a temporary folder, /share on the device. The host puts the story
 there; the device's init leaves the output, the logs and, last of all, the result (see
 init/init.cpp). A run without a result has failed, whatever QEMU says: a kernel that panics ends
-QEMU with status 0.
+QEMU with status 0. A story that ends the device itself says so in its head: a line
+"# ends: REQUEST" with the "sys.powerctl" request that is to end the run.
 
 Each run has a copy of its disk to itself. A story may have the power cut (see
 stories/power_cuts.story): the device then starts again on the same disk and runs the story from its
@@ -12,6 +13,8 @@ beginning. /share/boot holds the number of the start, from 1.
 
 from __future__ import annotations
 
+import dataclasses
+import re
 import shutil
 import subprocess
 import tempfile
@@ -79,6 +82,20 @@ class Outcome:
     log: str  # the story's output
 
 
+def fit_to_end(outcome: Outcome, story_text: str) -> Outcome:
+    """The outcome of a story as its head has it end: the right request is an exit status of 0."""
+    wanted = re.search(r"^# ends: (.*)$", story_text, re.MULTILINE)
+    if wanted is None or outcome.problem:
+        return outcome
+    request = outcome.power_request
+    if request == wanted[1]:
+        return dataclasses.replace(outcome, status=0)
+    if request is None and outcome.status != 0:
+        return outcome
+    problem = f"the device ended with the request {request}, not {wanted[1]}"
+    return dataclasses.replace(outcome, status=None, problem=problem)
+
+
 @dataclass
 class Device:
     """One run of the virtual device; a context manager, which ends QEMU and removes the folders."""
@@ -133,7 +150,8 @@ class Device:
                 running = False
             if running:
                 time.sleep(POLL_SECONDS)
-        return self._outcome(time.monotonic() - started, timed_out)
+        outcome = self._outcome(time.monotonic() - started, timed_out)
+        return fit_to_end(outcome, story.read_text())
 
     def run_console(self) -> int:
         """Boots with a shell on this terminal and waits for its end; returns its exit status."""

@@ -82,6 +82,22 @@ class RunStory(unittest.TestCase):
         self.assertEqual((outcome.status, outcome.log), (0, "1\nnew\n2\nkept"))
         self.assertEqual(self.disk.read_text(), "new\n")
 
+    def test_story_that_ends_the_device(self) -> None:
+        self.story.write_text("# Shows something\n# ends: reboot,a,b\n")
+        cases = (
+            ("echo reboot,a,b >powerctl", 0, ""),
+            ("echo reboot,a >powerctl", None, "the request reboot,a, not reboot,a,b"),
+            ("echo 0 >result", None, "the request None, not reboot,a,b"),
+            ("echo 1 >result", 1, ""),
+            ("exit 0", None, "no result"),
+        )
+        for script, status, problem in cases:
+            with self.subTest(script):
+                outcome, _ = self.run_story(script)
+                self.assertEqual(outcome.status, status)
+                self.assertIn(problem, outcome.problem)
+                self.assertEqual(outcome.problem == "", problem == "")
+
     def test_power_request(self) -> None:
         outcome, _ = self.run_story("echo reboot,recovery >powerctl")
         self.assertEqual((outcome.power_request, outcome.status), ("reboot,recovery", None))

@@ -1,0 +1,42 @@
+#include "cli/power_commands.h"
+
+#include <CLI/CLI.hpp>
+#include <memory>
+#include <nlohmann/json.hpp>
+#include <string>
+
+#include "cli/exit_status.h"
+#include "otautil/sysutil.h"
+
+namespace sentrova {
+namespace {
+
+ExitStatus shut_down(const std::string& reason, const Output& output) {
+  if (!Shutdown(reason)) {
+    output.error("the device's init cannot be asked");
+    return kExitServiceFailed;
+  }
+  output.result("the device is powering off", {{"requested", true}});
+  return kExitSuccess;
+}
+
+CLI::App* add_command(CLI::App& app, const char* name, const char* description,
+                      const std::shared_ptr<std::string>& reason, const char* reason_description) {
+  CLI::App* const command = app.add_subcommand(name, description);
+  command->add_option("reason", *reason, reason_description);
+  return command;
+}
+
+}  // namespace
+
+void add_power_commands(CLI::App& app, const Output& output, int& status) {
+  // Shared with the callbacks, which outlive this function.
+  const auto reason = std::make_shared<std::string>();
+  add_command(app, "reboot", "Reboot the device", reason,
+              "Where to, as recovery or bootloader; the system if left out")
+      ->callback([reason] { Reboot(*reason); });
+  add_command(app, "shutdown", "Power the device off", reason, "Why, for the device's records")
+      ->callback([reason, &output, &status] { status = shut_down(*reason, output); });
+}
+
+}  // namespace sentrova
