@@ -7,8 +7,9 @@
 #include "common/export.h"
 
 // What the vendor adds to the volume table: rows for removable media, the classification of the
-// data partition's encryption, the system partition's row, the removable devices themselves, and
-// mounting and unmounting where the platform's own is not enough.
+// data partition's encryption, the system partition's row, the removable devices themselves,
+// mounting and unmounting where the platform's own is not enough, and the partitions that hold the
+// vendor's property files.
 //
 // Messages go to standard output, each line beginning with "[ROOTS]" and a level. Nothing here
 // takes a lock; see roots.h for threads. Properties are the platform's.
@@ -105,3 +106,46 @@ SENTROVA_API int ensure_path_unmounted(const std::string& path, bool force);
 // first if it is empty. Returns 0 whatever came of each volume, which the messages tell (these
 // without a tag); -1 if there is no table.
 SENTROVA_API int setup_install_unmounts();
+
+// The vendor's properties stand in files on two small partitions, "oem" and "kcf", the persistent
+// ones on the data partition. A property loader outside this library reads them: it is asked by a
+// request property set to "1" and sets a completion property to "1" when done. One that does not
+// answer within 5 seconds is not waited for any longer and holds nothing else up. A completion that
+// still is "1" from before ends the wait at once: who asks a second time sets it to "0" first.
+
+// Mounts "oem" and "kcf" (MountCustomPartition), asks for their properties ("recovery.load.props",
+// answered by "recovery.properties.loaded"), calls zunoPropertyPrebackup and unmounts both
+// (UnMountCustomPartition), unless "recovery.repair_mode" is on. Always returns true; whether the
+// properties are there, "recovery.oem_properties.ready" and "recovery.kcf_properties.ready" tell.
+// Blocks for some 20 seconds at most, more where the kernel takes long to mount.
+SENTROVA_API bool zuno_load_property();
+
+// Replaces the backups /cache/recovery/oem.prop and kcf.prop by copies of /tmp/oem.prop and
+// kcf.prop, mode 0644, once the loader has both ("recovery.oem_properties.ready" is "true", and so
+// is "recovery.kcf_properties.ready" on a device with "ro.recovery.kcf.support" "1"). Otherwise
+// leaves them and asks the loader to load them ("recovery.load.backup_props", answered by
+// "recovery.backup_props.loaded"). Whether files could be removed or copied is not told; a working
+// copy that is missing leaves an empty backup.
+SENTROVA_API void zunoPropertyPrebackup();
+
+// Removes the two backups.
+SENTROVA_API void zunoPropertyPostBackup();
+
+// Mounts /data, if it can, and asks for the persistent properties ("recovery.load.persist_props",
+// answered by "recovery.persist_properties.loaded"). Returns whether
+// "recovery.persistent_properties.ready" is then exactly "true".
+SENTROVA_API bool zuno_load_persist_property();
+
+// Mounts a vendor partition, by the row for "/" + `name` or else for "/vendor/" + `name`, on the
+// row's mount point, which must exist. A logical partition has the device-mapper name of the row's
+// block device and the slot suffix: it is mapped, writable, from the current slot's table of super
+// if it is not mapped yet; a suspended one is not touched, and the row's block device is tried. The
+// device of any other row is waited for, at most 4 seconds. The outcome is only logged; without a
+// name or a row nothing happens.
+SENTROVA_API void MountCustomPartition(std::string name);
+
+// Unmounts the partition of the row for "/" + `name` (one below /vendor stays) and removes the
+// device-mapper device `name` and the slot suffix if the row is a logical partition's. It stays
+// when it is suspended or the unmount fails. The outcome is only logged; without a name or a row
+// nothing happens.
+SENTROVA_API void UnMountCustomPartition(std::string name);

@@ -9,6 +9,7 @@
 #include <functional>
 #include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "recovery_utils/roots_test.h"
@@ -55,6 +56,9 @@ class MountTest : public RootsTest {
     android::base::SetLogger(android::base::StderrLogger);
     return messages;
   }
+
+  // Returns the calls so far and forgets them.
+  Calls take_calls() { return std::exchange(platform_.calls, {}); }
 
   FakeDeviceMapper& device_mapper_ = FakeDeviceMapper::instance();
 

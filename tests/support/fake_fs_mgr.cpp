@@ -39,6 +39,25 @@ bool EnsurePathUnmounted(Fstab* fstab, const std::string& path) {
   return FakeFsMgr::instance().ensure_unmounted(fstab, path);
 }
 
+bool CreateLogicalPartition(const CreateLogicalPartitionParams& params, std::string* path) {
+  FakeFsMgr::instance().calls.push_back("create " + params.partition_name + " from " +
+                                        params.block_device + ", table " +
+                                        std::to_string(params.metadata_slot.value_or(UINT32_MAX)) +
+                                        (params.force_writable ? ", writable, " : ", read-only, ") +
+                                        std::to_string(params.timeout_ms.count()) + " ms");
+  const std::string node = FakeFsMgr::instance().create_logical(params);
+  if (node.empty()) {
+    return false;
+  }
+  *path = node;
+  return true;
+}
+
+bool DestroyLogicalPartition(const std::string& name) {
+  FakeFsMgr::instance().calls.push_back("destroy " + name);
+  return true;
+}
+
 std::string GetSystemRoot() {
   return FakeFsMgr::instance().system_root;
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <fs_mgr_dm_linear.h>
 #include <fstab/fstab.h>
 
 #include <functional>
@@ -18,12 +19,16 @@ struct FakeFsMgr {
       ensure_mounted = [](auto*, const auto&, const auto&) { return false; };
   std::function<bool(android::fs_mgr::Fstab*, const std::string&)> ensure_unmounted =
       [](auto*, const auto&) { return false; };
+  // The node of a logical partition that is mapped, "" for a failure.
+  std::function<std::string(const android::fs_mgr::CreateLogicalPartitionParams&)> create_logical =
+      [](const auto&) { return ""; };
   std::string system_root = "/system";
   std::string slot_suffix;
   std::string super_partition_name = "super";
 
   // "read fstab", "mount /dev/block/x at /data", "ensure mounted /data/x at /mnt", "ensure
-  // unmounted /data", "super partition of slot -1". The fake device mapper and the kernel script
+  // unmounted /data", "super partition of slot -1", "create x_a from /dev/block/y, table 0,
+  // writable, 1000 ms", "destroy x_a". The fake device mapper and the kernel script
   // add theirs, so that the order of all shows.
   std::vector<std::string> calls;
 
