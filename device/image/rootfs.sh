@@ -25,7 +25,7 @@ prune_rootfs() {
 make_folders() {
   (
     cd "$1" || exit
-    mkdir -p cache data dev etc metadata odm/etc proc share sys tmp build \
+    mkdir -p cache data dev etc kcf metadata oem odm/etc proc share sys tmp build \
       mnt/{sdcard,otg,vendor} system/{bin,etc,lib64} vendor/{bin,etc,lib64} lib/modules
   )
 }

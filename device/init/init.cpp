@@ -32,6 +32,7 @@ constexpr char kConsoleProperty[] = "ro.boot.console";
 const std::vector<ServiceDefinition>& service_table() {
   static const std::vector<ServiceDefinition> table = {
       {"servicemanager", {"/system/bin/servicemanager"}},
+      {"property_loader", {"/system/bin/property_loader"}},
       {"rescue_host", {"/system/bin/rescue_host"}},
       {"keystore2", {"/system/bin/keystore2"}, false},
   };
