@@ -7,6 +7,7 @@
 #include "cli/exit_status.h"
 #include "cli/output.h"
 #include "cli/power_commands.h"
+#include "cli/property_commands.h"
 #include "cli/status_command.h"
 #include "cli/unlock_command.h"
 
@@ -24,6 +25,33 @@ constexpr char kUnlockHelp[] =
     "terminal, one otherwise), and show what is readable then";
 constexpr char kMethodHelp[] =
     "How the data is encrypted: fbe by file, fde the whole disk, auto as the device says";
+
+struct PropertyVerb {
+  const char* name;
+  const char* help;
+  sentrova::ExitStatus (*command)(const sentrova::Output& output);
+};
+
+constexpr PropertyVerb kPropertyVerbs[] = {
+    {"load", "Load them from the vendor's partitions, else from the backups",
+     sentrova::load_properties},
+    {"backup", "Back up their files, or load the backups where they are not ready",
+     sentrova::back_up_properties},
+    {"clear", "Remove the backups", sentrova::clear_property_backups},
+    {"persist", "Load the persistent properties from the data partition",
+     sentrova::load_persistent_properties},
+};
+
+void add_property_verbs(CLI::App& app, const sentrova::Output& output, int& status) {
+  CLI::App* const properties =
+      app.add_subcommand("properties", "Load the vendor's properties, in this process");
+  properties->require_subcommand(1);
+  for (const PropertyVerb& verb : kPropertyVerbs) {
+    properties->add_subcommand(verb.name, verb.help)->callback([&] {
+      status = verb.command(output);
+    });
+  }
+}
 
 int run(int argc, char** argv) {
   CLI::App app(kDescription, "sentrova");
@@ -55,6 +83,8 @@ int run(int argc, char** argv) {
       ->capture_default_str();
   unlock->callback([&] { status = sentrova::unlock_data(user_id, method, output); });
   sentrova::add_power_commands(app, output, status);
+
+  add_property_verbs(app, output, status);
 
   try {
     app.parse(argc, argv);

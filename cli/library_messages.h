@@ -1,0 +1,20 @@
+#pragma once
+
+#include <android-base/unique_fd.h>
+
+namespace sentrova {
+
+// While one is alive, what the library writes to standard output goes to standard error, so that
+// standard output holds the answer alone. One at a time; for programs with one thread.
+class LibraryMessagesToStderr {
+ public:
+  LibraryMessagesToStderr();
+  ~LibraryMessagesToStderr();
+  LibraryMessagesToStderr(const LibraryMessagesToStderr&) = delete;
+  LibraryMessagesToStderr& operator=(const LibraryMessagesToStderr&) = delete;
+
+ private:
+  android::base::unique_fd original_;
+};
+
+}  // namespace sentrova

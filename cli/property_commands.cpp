@@ -1,0 +1,96 @@
+#include "cli/property_commands.h"
+
+#include <android-base/properties.h>
+#include <sys/stat.h>
+
+#include <nlohmann/json.hpp>
+#include <string>
+
+#include "cli/library_messages.h"
+#include "recovery_utils/roots.h"
+#include "recovery_utils/roots_ex.h"
+
+namespace sentrova {
+
+namespace {
+
+constexpr char kBackupFolder[] = "/cache/recovery";
+
+// What the property loader sets to "1" when it is done.
+constexpr const char* kCompletions[] = {
+    "recovery.properties.loaded",
+    "recovery.backup_props.loaded",
+    "recovery.persist_properties.loaded",
+};
+
+// An answer of before would end the library's wait for this one.
+void forget_answers() {
+  for (const char* completion : kCompletions) {
+    android::base::SetProperty(completion, "0");
+  }
+}
+
+// Calls the library with its volume table loaded and the folder of the backups there, if possible.
+// Returns false, after saying so, where there is no table.
+template <typename Call>
+bool with_volumes(const Output& output, Call call) {
+  {
+    const LibraryMessagesToStderr messages;
+    if (!get_fstab_default().empty()) {
+      if (ensure_path_mounted("/cache") == 0) {
+        mkdir(kBackupFolder, 0755);
+      }
+      forget_answers();
+      call();
+      return true;
+    }
+  }
+  output.error("the device's volume table cannot be read");
+  return false;
+}
+
+bool is_ready(const char* property) {
+  return android::base::GetProperty(property, "") == "true";
+}
+
+ExitStatus show_vendor_properties(const Output& output) {
+  const bool oem = is_ready("recovery.oem_properties.ready");
+  const bool kcf = is_ready("recovery.kcf_properties.ready");
+  output.result(std::string("oem properties: ") + (oem ? "ready" : "not ready") +
+                    "; kcf properties: " + (kcf ? "ready" : "not ready"),
+                {{"oem_ready", oem}, {"kcf_ready", kcf}});
+  return oem ? kExitSuccess : kExitAnswerIsNo;
+}
+
+}  // namespace
+
+ExitStatus load_properties(const Output& output) {
+  return with_volumes(output, zuno_load_property) ? show_vendor_properties(output)
+                                                  : kExitServiceFailed;
+}
+
+ExitStatus back_up_properties(const Output& output) {
+  return with_volumes(output, zunoPropertyPrebackup) ? show_vendor_properties(output)
+                                                     : kExitServiceFailed;
+}
+
+ExitStatus clear_property_backups(const Output& output) {
+  if (!with_volumes(output, zunoPropertyPostBackup)) {
+    return kExitServiceFailed;
+  }
+  output.result("the backups are removed", {{"cleared", true}});
+  return kExitSuccess;
+}
+
+ExitStatus load_persistent_properties(const Output& output) {
+  bool ready = false;
+  if (!with_volumes(output, [&] { ready = zuno_load_persist_property(); })) {
+    return kExitServiceFailed;
+  }
+  output.result(
+      ready ? "the persistent properties are loaded" : "the persistent properties are not ready",
+      {{"persistent_ready", ready}});
+  return ready ? kExitSuccess : kExitAnswerIsNo;
+}
+
+}  // namespace sentrova
