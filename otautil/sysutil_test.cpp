@@ -1,0 +1,221 @@
+#include "otautil/sysutil.h"
+
+#include <android-base/file.h>
+#include <android-base/logging.h>
+#include <android-base/stringprintf.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <filesystem>
+#include <string>
+#include <utility>
+#include <vector>
+
+namespace {
+
+using android::base::StringPrintf;
+using android::base::WriteStringToFile;
+
+constexpr size_t kBlock = 4096;
+constexpr size_t kDeviceBlocks = 16;
+
+size_t open_descriptors() {
+  const std::filesystem::directory_iterator entries("/proc/self/fd");
+  return static_cast<size_t>(std::distance(begin(entries), end(entries)));
+}
+
+// A file in the place of a block device, each block of which is filled with a letter of its own
+// and ends within a page, and a block map for it.
+class BlockMaps : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    // The machine's page has the size of the blocks, on the device as well.
+    ASSERT_EQ(sysconf(_SC_PAGESIZE), static_cast<long>(kBlock));
+    for (size_t i = 0; i < kDeviceBlocks; ++i) {
+      content_ += std::string(kBlock, static_cast<char>('a' + i));
+    }
+    content_.resize(content_.size() - 10);
+    ASSERT_TRUE(WriteStringToFile(content_, device_.path));
+    android::base::SetLogger([this](auto, auto, auto, auto, auto, const char* text) {
+      log_ += text + std::string("\n");
+    });
+  }
+  void TearDown() override { android::base::SetLogger(android::base::StderrLogger); }
+
+  // The lines of a map from the second on behind the device's path.
+  std::string map_of(const std::string& rest) const { return device_.path + ("\n" + rest); }
+
+  bool map(const std::string& text) {
+    log_.clear();
+    EXPECT_TRUE(WriteStringToFile(text, map_file_.path));
+    return mapping_.MapFile(std::string("@") + map_file_.path);
+  }
+
+  std::string mapped() const {
+    return std::string(reinterpret_cast<const char*>(mapping_.addr), mapping_.length);
+  }
+
+  // How often the device is mapped in this process.
+  size_t device_mappings() const {
+    std::string maps;
+    EXPECT_TRUE(android::base::ReadFileToString("/proc/self/maps", &maps));
+    size_t count = 0;
+    for (size_t at = maps.find(device_.path); at != std::string::npos;
+         at = maps.find(device_.path, at + 1)) {
+      ++count;
+    }
+    return count;
+  }
+
+  TemporaryFile device_;
+  TemporaryFile map_file_;
+  std::string content_;
+  std::string log_;
+  MemMapping mapping_;
+};
+
+TEST_F(BlockMaps, AreMappedInTheirOrder) {
+  const auto blocks = [this](size_t first, size_t end) {
+    return content_.substr(first * kBlock, (end - first) * kBlock);
+  };
+  const std::pair<std::string, std::string> cases[] = {
+      {"12188 4096\n2\n10 12\n3 4", (blocks(10, 12) + blocks(3, 4)).substr(0, 12188)},
+      {"4096 4096\n1\n7 8", blocks(7, 8)},
+      {"4097 4096\n1\n7 9\n\n \t\n", blocks(7, 9).substr(0, 4097)},
+      {" 8192\t4096 rest\n+2 of them\n3 4 x\n3 4 x", blocks(3, 4) + blocks(3, 4)},
+      {"8182 8192\n1\n7 8", content_.substr(14 * kBlock)},
+      {"1024 1024\n1\n8 9", blocks(2, 3).substr(0, 1024)},
+  };
+  for (const auto& [rest, expected] : cases) {
+    ASSERT_TRUE(map(map_of(rest))) << rest << log_;
+    EXPECT_EQ(mapped(), expected) << rest;
+    EXPECT_EQ(log_, StringPrintf("mmapped %zu ranges\n", mapping_.ranges()));
+  }
+  const BlockMapData data = BlockMapData::ParseBlockMapFile(map_file_.path);
+  EXPECT_EQ(data.device_path, device_.path);
+  EXPECT_EQ(data.file_size, 1024u);
+  EXPECT_EQ(data.block_size, 1024u);
+  EXPECT_EQ(data.block_ranges, RangeSet({{8, 9}}));
+}
+
+TEST_F(BlockMaps, WithADefectAreRefusedByName) {
+  const std::string invalid_data = "Invalid data in block map file: size ";
+  const std::pair<std::string, std::string> cases[] = {
+      {"8192 4096\n1", "Block map file is too short: 3"},
+      {"8192\n1\n0 2", "Failed to parse file size and block size: 8192"},
+      {"0 4096\n1\n0 2", "Invalid size in block map file: size 0, blksize 4096"},
+      {"8192 0\n1\n0 2", "Invalid size in block map file: size 8192, blksize 0"},
+      {"8192 4096\nx\n0 2", "Failed to parse block map header: x"},
+      {"8192 4096\n0\n0 2", invalid_data + "8192, blksize 4096, range_count 0, lines 4"},
+      {"8192 4096\n2\n0 2", invalid_data + "8192, blksize 4096, range_count 2, lines 4"},
+      {"8192 4096\n1\n0 1\n1 2", invalid_data + "8192, blksize 4096, range_count 1, lines 5"},
+      {"4294967296 1\n1\n0 4294967296",
+       invalid_data + "4294967296, blksize 1, range_count 1, lines 4"},
+      {"-1 4096\n-1\n0 2", invalid_data + "18446744073709551615, blksize 4096, range_count "
+                                          "18446744073709551615, lines 4"},
+      {"8192 4096\n2\n0 1\n\n1 2", invalid_data + "8192, blksize 4096, range_count 2, lines 6"},
+      {"8192 4096\n2\n0 1\n2", "failed to parse range 1: 2"},
+      {"8192 4096\n1\n2 2", "Invalid range: 2 2"},
+      {"8192 4096\n1\n3 2", "Invalid range: 3 2"},
+      {"8192 4096\n1\n0 3", "Invalid range: 0 3"},
+      {"8192 4096\n1\n0 -1", "Invalid range: 0 18446744073709551615"},
+      {"8192 4096\n1\n0 1", "Invalid ranges: remaining blocks 1"},
+  };
+  for (const auto& [rest, message] : cases) {
+    ASSERT_TRUE(map(map_of("4096 4096\n1\n0 1")));
+    EXPECT_FALSE(map(map_of(rest))) << rest;
+    EXPECT_EQ(log_, message + "\nMap of '@" + map_file_.path + "' failed\n");
+    EXPECT_EQ(mapping_.addr, nullptr);
+    EXPECT_EQ(device_mappings(), 0u) << "what was mapped before is let go";
+  }
+}
+
+TEST_F(BlockMaps, ThatTheDeviceCannotServeLeaveNothingBehind) {
+  const size_t descriptors = open_descriptors();
+  const std::pair<std::string, std::string> cases[] = {
+      // Past the device's end; a block of it alone would be mapped and raise SIGBUS when read.
+      {"8192 4096\n1\n15 17", "failed to map range 15: 17: No such device or address"},
+      {"8192 4096\n2\n0 1\n16 17", "failed to map range 16: 17: No such device or address"},
+      {"4096 4096\n1\n18446744073709551614 18446744073709551615",
+       "failed to map range 18446744073709551614: 18446744073709551615: Value too large"},
+      {"4096 4096\n1\n2251799813685247 2251799813685248",
+       "failed to map range 2251799813685247: 2251799813685248: Value too large"},
+      {"4096 4096\n1\n4503599627370496 4503599627370497",  // its offset in 64 bits is 0
+       "failed to map range 4503599627370496: 4503599627370497: Value too large"},
+      // Not at a page.
+      {"1024 1024\n1\n1 2", "failed to map range 1: 2: Invalid argument"},
+      {"2048 1024\n2\n0 1\n4 5", "failed to map range 4: 5: Invalid argument"},
+      {"18446744060824649730 4294967295\n1\n0 4294967294", "failed to reserve address space: "},
+  };
+  for (const auto& [rest, message] : cases) {
+    EXPECT_FALSE(map(map_of(rest))) << rest;
+    EXPECT_EQ(log_.rfind(message, 0), 0u) << log_;
+    EXPECT_EQ(device_mappings(), 0u) << rest;
+    EXPECT_EQ(mapping_.ranges(), 0u) << rest;
+  }
+  EXPECT_FALSE(map("/nonexistent/device\n4096 4096\n1\n0 1"));
+  EXPECT_EQ(log_.rfind("failed to open block device /nonexistent/device: No such file", 0), 0u);
+  for (const char* no_device : {"/dev/zero", "/dev/null", "/proc"}) {
+    EXPECT_FALSE(map(no_device + std::string("\n4096 4096\n1\n0 1"))) << no_device;
+  }
+  EXPECT_EQ(open_descriptors(), descriptors);
+}
+
+TEST_F(BlockMaps, OfMoreRangesThanAProcessMayMapAreRefusedCleanly) {
+  std::string limit;
+  ASSERT_TRUE(android::base::ReadFileToString("/proc/sys/vm/max_map_count", &limit));
+  const size_t count = std::stoul(limit) + 1;
+  if (count > 1'000'000) {
+    GTEST_SKIP() << "this machine allows " << limit << " mappings";
+  }
+  std::string rest = StringPrintf("%zu %zu\n%zu\n", count * kBlock, kBlock, count);
+  for (size_t i = 0; i < count; ++i) {
+    rest += i % 2 == 0 ? "5 6\n" : "3 4\n";  // never in a row, which the kernel would merge
+  }
+  EXPECT_FALSE(map(map_of(rest)));
+  EXPECT_EQ(log_.rfind("failed to map range ", 0), 0u) << log_;
+  EXPECT_NE(log_.find(": Cannot allocate memory\n"), std::string::npos) << log_;
+  EXPECT_EQ(device_mappings(), 0u);
+}
+
+TEST_F(BlockMaps, PlainFilesAreMappedWhole) {
+  ASSERT_TRUE(mapping_.MapFile(device_.path)) << log_;
+  EXPECT_EQ(mapped(), content_);
+  EXPECT_EQ(mapping_.ranges(), 1u);
+  ASSERT_TRUE(mapping_.MapFD(device_.fd));
+  EXPECT_EQ(device_mappings(), 1u);
+
+  MemMapping moved = std::move(mapping_);
+  EXPECT_EQ(mapping_.addr, nullptr);  // NOLINT(bugprone-use-after-move): is emptied by it
+  EXPECT_EQ(moved.length, content_.size());
+  moved = MemMapping();
+  EXPECT_EQ(device_mappings(), 0u);
+}
+
+TEST_F(BlockMaps, FilesThatCannotBeMappedAreNamed) {
+  const TemporaryFile empty;
+  const TemporaryDir folder;
+  const std::string fifo = folder.path + std::string("/fifo");
+  ASSERT_EQ(mkfifo(fifo.c_str(), 0600), 0);
+  const std::pair<std::string, std::string> cases[] = {
+      {"", "Empty filename\n"},
+      {"@", "Failed to read : No such file or directory\nMap of '@' failed\n"},
+      {"/nonexistent", "Unable to open '/nonexistent': No such file or directory\n"},
+      {empty.path, std::string("Map of '") + empty.path + "' failed\n"},
+      {fifo, "Map of '" + fifo + "' failed\n"},
+  };
+  for (const auto& [name, last_message] : cases) {
+    log_.clear();
+    EXPECT_FALSE(mapping_.MapFile(name)) << name;
+    EXPECT_TRUE(log_.ends_with(last_message)) << log_;
+  }
+  log_.clear();
+  EXPECT_FALSE(mapping_.MapFD(-1));
+  EXPECT_EQ(log_, "fstat(-1) failed: Bad file descriptor\n");
+  log_.clear();
+  EXPECT_FALSE(mapping_.MapFD(empty.fd));
+  EXPECT_EQ(log_, StringPrintf("mmap(0, R, PRIVATE, %d, 0) failed: Invalid argument\n", empty.fd));
+}
+
+}  // namespace
