@@ -3,6 +3,7 @@
 #include <exception>
 #include <string>
 
+#include "cli/blockmap_command.h"
 #include "cli/credential_commands.h"
 #include "cli/exit_status.h"
 #include "cli/output.h"
@@ -85,6 +86,7 @@ int run(int argc, char** argv) {
   sentrova::add_power_commands(app, output, status);
 
   add_property_verbs(app, output, status);
+  sentrova::add_blockmap_command(app, output, status);
 
   try {
     app.parse(argc, argv);
