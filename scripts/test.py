@@ -9,7 +9,7 @@ import time
 import traceback
 from collections.abc import Callable
 
-from scripts import building, device_tests, lint, programs, script_tests
+from scripts import building, device_tests, fuzz, lint, programs, script_tests
 from scripts.tally import Tally
 
 
@@ -37,6 +37,7 @@ PARTS: dict[str, tuple[str, Callable[[], Tally]]] = {
     "native": ("build with g++, unit tests", lambda: build_and_run("native")),
     "asan": ("build with clang++ and sanitizers, unit tests", lambda: build_and_run("asan")),
     "device": ("cross build; unit tests, device tests and stories on the device", run_device),
+    "fuzz": ("build with clang++ and libFuzzer, a few seconds of each fuzz target", fuzz.run_fuzz),
     "lint": ("clang-format and clang-tidy", run_lint),
 }
 
