@@ -26,7 +26,8 @@ SENTROVA_API int datadump_enable();
 SENTROVA_API int datadump_disable();
 
 // Sets the offset of an armed dump; 0 clears it and leaves the dump armed. 0, or -1 if the record
-// could not be read or written or is not armed; then the old one stays.
+// could not be read or is not armed (then the old one stays) or could not be written (then it may
+// be partly written).
 SENTROVA_API int datadump_resize(uint64_t dump_offset);
 
 // Returns 0 when disarmed, 1 when armed with offset 0, 2 when armed with another offset, or -1 when

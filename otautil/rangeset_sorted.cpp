@@ -60,8 +60,7 @@ void SortedRangeSet::Insert(size_t start, size_t length) {
 }
 
 bool SortedRangeSet::Overlaps(size_t start, size_t length) const {
-  const Range touched = touched_blocks(start, length);
-  return touched.first < touched.second && Overlaps(RangeSet({touched}));
+  return Overlaps(RangeSet({touched_blocks(start, length)}));
 }
 
 size_t SortedRangeSet::GetOffsetInRangeSet(size_t old_offset) const {

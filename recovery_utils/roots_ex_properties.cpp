@@ -51,9 +51,12 @@ bool is_ready(const char* property) {
 }
 
 bool are_vendor_properties_ready() {
+  if (!is_ready("recovery.oem_properties.ready")) {
+    return false;
+  }
   const bool kcf_pending = GetProperty("ro.recovery.kcf.support", "") == "1" &&
                            !is_ready("recovery.kcf_properties.ready");
-  return is_ready("recovery.oem_properties.ready") && !kcf_pending;
+  return !kcf_pending;
 }
 
 }  // namespace
