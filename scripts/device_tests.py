@@ -9,7 +9,7 @@ from scripts.building import BUILD
 from scripts.programs import test_programs
 from scripts.tally import Tally, count_program, describe_status
 
-PROGRAMS_TIMEOUT_SECONDS = 420
+PROGRAMS_TIMEOUT_SECONDS = 600
 STORY_TIMEOUT_SECONDS = 240
 # The tests of file labels need a security module that takes their policy.
 PROGRAMS_KERNEL_ARGUMENTS = ["security=selinux", "selinux=1"]
