@@ -44,8 +44,8 @@ class SENTROVA_API DeviceMapper {
   // Removes a device. False with `errno` EBUSY while it is open or mounted, ENXIO if there is none.
   bool DeleteDevice(const std::string& name);
 
-  // As DeleteDevice, and true where there is no such device. False as well when the kernel could
-  // not be asked whether there is.
+  // As DeleteDevice, and true where there is no such device or no device mapper at all. False as
+  // well when the kernel could not be asked whether there is.
   bool DeleteDeviceIfExists(const std::string& name);
 
  private:

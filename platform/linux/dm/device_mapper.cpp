@@ -124,7 +124,7 @@ bool DeviceMapper::DeleteDevice(const std::string& name) {
 bool DeviceMapper::DeleteDeviceIfExists(const std::string& name) {
   const std::optional<dm_info> info = query(name);
   if (!info) {
-    return false;
+    return errno == ENODEV;
   }
   return info->exists == 0 || DeleteDevice(name);
 }

@@ -1,11 +1,12 @@
 #include <gtest/gtest.h>
-#include <libdm/dm_table.h>
+#include <libdm/dm.h>
 
 #include <array>
 #include <limits>
 
 namespace {
 
+using android::dm::DeviceMapper;
 using android::dm::DmTable;
 using android::dm::DmTargetCrypt;
 using android::dm::DmTargetLinear;
@@ -53,6 +54,10 @@ TEST(DmTable, ATargetThatWouldChangeTheParametersMeaningSpoilsIt) {
       return t.Emplace<DmTargetCrypt>(0U, 8U, "aes-xts-plain64", key, 0U, "/dev/a", 0U);
     })) << key;
   }
+}
+
+TEST(DeviceMapper, HasNothingToDeleteWithOrWithoutADriver) {
+  EXPECT_TRUE(DeviceMapper::Instance().DeleteDeviceIfExists("no_such_device"));
 }
 
 }  // namespace

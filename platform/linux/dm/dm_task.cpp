@@ -46,9 +46,10 @@ std::mutex& library_mutex() {
   return *mutex;
 }
 
-// Where the library gives no reason, the driver could not be reached.
+// Where the library gives no reason, the request did not get through. ENODEV is kept for a system
+// without the driver.
 bool set_errno(int error) {
-  errno = error != 0 ? error : ENODEV;
+  errno = error != 0 ? error : EIO;
   return false;
 }
 
