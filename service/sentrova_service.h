@@ -15,7 +15,8 @@ namespace android {
 extern template class SENTROVA_API BnInterface<ISentrovaService>;
 
 // The server side of ISentrovaService without the operations: it takes transactions apart and calls
-// the operations through their virtual slots. A subclass brings the six operations.
+// the operations through their virtual slots. A subclass brings the six operations; it is compiled
+// without run-time type information (-fno-rtti), as the library has no type descriptors to link to.
 class SENTROVA_API BnSentrovaService : public BnInterface<ISentrovaService> {
  public:
   // Handles codes 1 to 6 and leaves every other code to BBinder::onTransact. Returns NO_ERROR after
