@@ -32,6 +32,7 @@ orient="auto"><path d="M0,0 L8,4 L0,8 z" fill="#334"/></marker></defs>
 """
 TEXT = ('<text x="{x:g}" y="{y:g}" text-anchor="middle" fill="#112" stroke="white" '
         'stroke-width="4" paint-order="stroke"{more}>{text}</text>\n')
+LANE_STYLE = ' stroke-dasharray="3 5" stroke-opacity="0.6"'
 LINE = '<line x1="{x1:g}" y1="{y1:g}" x2="{x2:g}" y2="{y2:g}" stroke="#334"{more}/>\n'
 
 
@@ -51,8 +52,7 @@ def draw(source: str) -> str:
 
     parts = [HEAD.format(width=width, height=height)]
     for x in columns.values():
-        parts.append(LINE.format(x1=x, y1=TOP, x2=x, y2=height, more=' stroke-dasharray="3 5" '
-                                 'stroke-opacity="0.6"'))
+        parts.append(LINE.format(x1=x, y1=TOP, x2=x, y2=height, more=LANE_STYLE))
     for lane in lanes:
         parts.append(draw_box(columns[lane[1]], lane[2]))
     for index, row in enumerate(rows):
