@@ -17,7 +17,8 @@ namespace android {
 // Every operation answers with one 32-bit number. Calls through a proxy answer with a negative
 // platform status other than -1 (utils/Errors.h, for instance DEAD_OBJECT) when the call did not
 // reach the service or its reply could not be read; -1 may also be the service refusing the
-// caller's interface token. Operations may be called from any thread, several at once.
+// caller's interface token. Operations may be called from any thread. The service takes no lock:
+// queries run side by side, but a client lets one unlocking operation end before the next begins.
 class SENTROVA_API ISentrovaService : public IInterface {
  public:
   DECLARE_META_INTERFACE(SentrovaService)
@@ -42,8 +43,8 @@ class SENTROVA_API ISentrovaService : public IInterface {
   // whatever `userId` says.
   virtual int32_t verifyUserPassWord(int userId, std::string password) = 0;
 
-  // Unlocks a device with full-disk encryption: 0 on success, -1 on failure. Takes up to about ten
-  // seconds. `userId` is not used.
+  // Unlocks a device with full-disk encryption: 0 on success, -1 on failure. Takes up to ten
+  // seconds, fifteen where the volume daemon cannot be killed. `userId` is not used.
   virtual int32_t fdeDecryptUser(int userId) = 0;
 
   // First step of a device with file-based encryption: 0 when the metadata encryption of /data is
