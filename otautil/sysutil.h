@@ -66,8 +66,9 @@ class MemMapping {
   SENTROVA_API bool MapFD(int fd);
 
   // Maps a file by its block map: one reservation of address space, and in it each range of the
-  // device. Block size and ranges must fit the machine's pages, and all blocks must be on the
-  // device. The last block is mapped whole. Returns as MapFile does.
+  // device. Block size and ranges must fit the machine's pages, and all of the file's bytes must be
+  // on the device. The last block is mapped whole, also where the device ends within it. Returns as
+  // MapFile does.
   SENTROVA_API bool MapBlockFile(const std::string& map_path);
 
   // The number of mappings: one for each block range.

@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <limits>
 #include <utility>
 
@@ -57,10 +58,11 @@ off64_t mappable_size(int device) {
   return size < 0 ? size : (size + page_size - 1) / page_size * page_size;
 }
 
-// Finds the bytes of a block range. Returns false, with errno set, if the device does not have them
-// all: mapped all the same, they would raise SIGBUS when they are read.
-bool find_bytes(const RangeSet::Range& range, uint32_t block_size, off64_t device_size,
-                off64_t& offset, size_t& length) {
+// Finds the bytes of a block range, of which the file may use the first `used_bytes` only. Returns
+// false, with errno set, if the device does not have all that it uses: mapped all the same, they
+// would raise SIGBUS when they are read.
+bool find_bytes(const RangeSet::Range& range, uint32_t block_size, uint64_t used_bytes,
+                off64_t device_size, off64_t& offset, size_t& length) {
   off64_t end = 0;
   if (__builtin_mul_overflow(range.first, block_size, &offset) ||
       __builtin_mul_overflow(range.second, block_size, &end) ||
@@ -71,7 +73,8 @@ bool find_bytes(const RangeSet::Range& range, uint32_t block_size, off64_t devic
   if (device_size < 0) {
     return false;
   }
-  if (end > device_size) {
+  if (offset > device_size ||
+      std::min<uint64_t>(length, used_bytes) > static_cast<uint64_t>(device_size - offset)) {
     errno = ENXIO;
     return false;
   }
@@ -188,7 +191,8 @@ bool MemMapping::map_ranges(const BlockMapData& map, int device, unsigned char* 
   for (const RangeSet::Range& range : map.block_ranges) {
     off64_t offset = 0;
     size_t size = 0;
-    if (!find_bytes(range, map.block_size, device_size, offset, size) ||
+    const uint64_t used_bytes = map.file_size - (reservation_size - remaining_size);
+    if (!find_bytes(range, map.block_size, used_bytes, device_size, offset, size) ||
         mmap64(next, size, PROT_READ, MAP_PRIVATE | MAP_FIXED, device, offset) == MAP_FAILED) {
       PLOG(ERROR) << "failed to map range " << range.first << ": " << range.second;
       return false;

@@ -85,6 +85,7 @@ TEST_F(BlockMaps, AreMappedInTheirOrder) {
       {"4097 4096\n1\n7 9\n\n \t\n", blocks(7, 9).substr(0, 4097)},
       {" 8192\t4096 rest\n+2 of them\n3 4 x\n3 4 x", blocks(3, 4) + blocks(3, 4)},
       {"8182 8192\n1\n7 8", content_.substr(14 * kBlock)},
+      {"4086 12288\n1\n5 6", content_.substr(15 * kBlock)},  // the device ends pages before it
       {"1024 1024\n1\n8 9", blocks(2, 3).substr(0, 1024)},
   };
   for (const auto& [rest, expected] : cases) {
@@ -136,6 +137,7 @@ TEST_F(BlockMaps, ThatTheDeviceCannotServeLeaveNothingBehind) {
   const std::pair<std::string, std::string> cases[] = {
       // Past the device's end; a block of it alone would be mapped and raise SIGBUS when read.
       {"8192 4096\n1\n15 17", "failed to map range 15: 17: No such device or address"},
+      {"4097 12288\n1\n5 6", "failed to map range 5: 6: No such device or address"},
       {"8192 4096\n2\n0 1\n16 17", "failed to map range 16: 17: No such device or address"},
       {"4096 4096\n1\n18446744073709551614 18446744073709551615",
        "failed to map range 18446744073709551614: 18446744073709551615: Value too large"},
