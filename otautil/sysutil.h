@@ -72,22 +72,23 @@ class MemMapping {
   SENTROVA_API bool MapBlockFile(const std::string& map_path);
 
   // The number of mappings: one for each block range.
-  size_t ranges() const { return mapped_ranges_.size(); }
+  size_t ranges() const { return mapped_ranges.size(); }
 
-  unsigned char* addr = nullptr;  // the file's first byte
-  size_t length = 0;              // the file's size in bytes
-
- private:
+  // One mapping; its length is in bytes.
   struct MappedRange {
     void* addr;
     size_t length;
   };
 
+  // To be read only: the object keeps its account of what it has mapped here.
+  unsigned char* addr = nullptr;           // the file's first byte
+  size_t length = 0;                       // the file's size in bytes
+  std::vector<MappedRange> mapped_ranges;  // what is unmapped in the end
+
+ private:
   bool map_ranges(const BlockMapData& map, int device, unsigned char* reservation,
                   size_t reservation_size);
   void unmap();
-
-  std::vector<MappedRange> mapped_ranges_;
 };
 
 // Asks init to reboot the device, by the property "sys.powerctl", and sleeps until init has done

@@ -96,18 +96,18 @@ MemMapping& MemMapping::operator=(MemMapping&& other) noexcept {
     unmap();
     addr = std::exchange(other.addr, nullptr);
     length = std::exchange(other.length, 0);
-    mapped_ranges_.swap(other.mapped_ranges_);
+    mapped_ranges.swap(other.mapped_ranges);
   }
   return *this;
 }
 
 void MemMapping::unmap() {
-  for (const auto& [range_addr, range_length] : mapped_ranges_) {
+  for (const auto& [range_addr, range_length] : mapped_ranges) {
     if (munmap(range_addr, range_length) != 0) {
       PLOG(ERROR) << "Failed to munmap(" << range_addr << ", " << range_length << ")";
     }
   }
-  mapped_ranges_.clear();
+  mapped_ranges.clear();
   addr = nullptr;
   length = 0;
 }
@@ -150,7 +150,7 @@ bool MemMapping::MapFD(int fd) {
   }
   addr = static_cast<unsigned char*>(memory);
   length = size;
-  mapped_ranges_.push_back({memory, size});
+  mapped_ranges.push_back({memory, size});
   return true;
 }
 
@@ -172,13 +172,13 @@ bool MemMapping::MapBlockFile(const std::string& map_path) {
     return false;
   }
   if (!map_ranges(map, device.get(), reservation.addr(), size)) {
-    mapped_ranges_.clear();
+    mapped_ranges.clear();
     return false;
   }
   addr = reservation.addr();
   length = static_cast<size_t>(map.file_size);
   reservation.keep();
-  LOG(INFO) << "mmapped " << mapped_ranges_.size() << " ranges";
+  LOG(INFO) << "mmapped " << mapped_ranges.size() << " ranges";
   return true;
 }
 
@@ -187,7 +187,7 @@ bool MemMapping::map_ranges(const BlockMapData& map, int device, unsigned char* 
   const off64_t device_size = mappable_size(device);
   unsigned char* next = reservation;
   size_t remaining_size = reservation_size;
-  mapped_ranges_.reserve(map.block_ranges.size());
+  mapped_ranges.reserve(map.block_ranges.size());
   for (const RangeSet::Range& range : map.block_ranges) {
     off64_t offset = 0;
     size_t size = 0;
@@ -197,7 +197,7 @@ bool MemMapping::map_ranges(const BlockMapData& map, int device, unsigned char* 
       PLOG(ERROR) << "failed to map range " << range.first << ": " << range.second;
       return false;
     }
-    mapped_ranges_.push_back({next, size});
+    mapped_ranges.push_back({next, size});
     next += size;
     remaining_size -= size;
   }

@@ -35,7 +35,6 @@ class Find_File {
   SENTROVA_API std::string Find_Internal(const std::string& file_name,
                                          const std::string& directory);
 
- private:
-  // The path of every directory entered, in that order, opened or not.
+  // The path of every directory entered, in that order, opened or not. To be read only.
   std::vector<std::string> searched_dirs;
 };

@@ -240,6 +240,7 @@ TEST_F(FindFile, AFinderRemembersWhatItEntered) {
   EXPECT_EQ("", finder.Find_Internal("second", root_));
   EXPECT_EQ("", finder.Find_Internal("first", at("sub")));
   EXPECT_EQ(root_ + "//second", finder.Find_Internal("second", root_ + "/"));
+  EXPECT_THAT(finder.searched_dirs, ElementsAre(root_, at("sub"), root_ + "/"));
 }
 
 TEST_F(FindFile, IgnoresEntriesOfUnknownType) {
