@@ -9,7 +9,7 @@ import time
 import traceback
 from collections.abc import Callable
 
-from scripts import building, device_tests, fuzz, lint, programs, script_tests
+from scripts import building, device_tests, fuzz, installation, lint, programs, script_tests
 from scripts.tally import Tally
 
 
@@ -35,6 +35,7 @@ def run_device() -> Tally:
 PARTS: dict[str, tuple[str, Callable[[], Tally]]] = {
     "scripts": ("tests of the project's own Python programs", script_tests.run_script_tests),
     "native": ("build with g++, unit tests", lambda: build_and_run("native")),
+    "install": ("what is installed and packaged, built against and run", installation.run_installation),
     "asan": ("build with clang++ and sanitizers, unit tests", lambda: build_and_run("asan")),
     "device": ("cross build; unit tests, device tests and stories on the device", run_device),
     "fuzz": ("build with clang++ and libFuzzer, a few seconds of each fuzz target", fuzz.run_fuzz),
