@@ -1,7 +1,7 @@
 # What `cmake --install` puts where, in three components:
 #   runtime      the two libraries, the platform's libraries for Linux, `sentrova`, servicemanager
 #   development  headers, CMake package, pkg-config files, the examples' sources
-#   standins     the virtual device's stand-ins for the vendor's two libraries
+#   standins     the virtual device's stand-ins for the vendor's two libraries, only when asked for
 #
 # The platform's libraries have names that others use too, and none has a version; they stand in a
 # folder of their own, and so do the headers. All finds each other relative to itself, so that the
@@ -39,7 +39,7 @@ install(TARGETS ${product_libraries}
 install(TARGETS ${platform_libraries}
   LIBRARY DESTINATION ${private_libdir} COMPONENT runtime)
 install(TARGETS ${standin_libraries}
-  LIBRARY DESTINATION ${private_libdir} COMPONENT standins)
+  LIBRARY DESTINATION ${private_libdir} COMPONENT standins EXCLUDE_FROM_ALL)
 install(TARGETS sentrova RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR} COMPONENT runtime)
 install(TARGETS servicemanager RUNTIME DESTINATION ${libexec_dir} COMPONENT runtime)
 # What must be built before an installation.
@@ -105,8 +105,9 @@ foreach(package sentrova-service sentrova-service-impl)
 endforeach()
 install(DIRECTORY ${PROJECT_SOURCE_DIR}/examples
   DESTINATION ${CMAKE_INSTALL_DATADIR}/doc/sentrova-dev COMPONENT development)
-foreach(package runtime:sentrova development:sentrova-dev standins:sentrova-standins)
-  string(REGEX MATCH "^(.*):(.*)$" _ ${package})
+foreach(package runtime:sentrova development:sentrova-dev "standins:sentrova-standins:EXCLUDE_FROM_ALL")
+  string(REPLACE ":" ";" parts ${package})
+  list(POP_FRONT parts component name)
   install(FILES ${PROJECT_SOURCE_DIR}/LICENSE RENAME copyright
-    DESTINATION ${CMAKE_INSTALL_DATADIR}/doc/${CMAKE_MATCH_2} COMPONENT ${CMAKE_MATCH_1})
+    DESTINATION ${CMAKE_INSTALL_DATADIR}/doc/${name} COMPONENT ${component} ${parts})
 endforeach()

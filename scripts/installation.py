@@ -60,9 +60,14 @@ def check_headers(prefix: Path) -> Tally:
 def check_prefix(work: Path) -> Tally:
     """`cmake --install` under a prefix, used through pkg-config after the tree was moved."""
     staged, prefix = work / "staged", work / "moved"
-    run_step("install", ["cmake", "--install", str(NATIVE), "--prefix", str(staged)])
+    install = ["cmake", "--install", str(NATIVE), "--prefix", str(staged)]
+    run_step("install", install)
+    tally = Tally()
+    tally.add_check("stand-ins are installed only when asked for",
+                    not list(staged.rglob(VENDOR_LIBRARY)))
+    run_step("install stand-ins", [*install, "--component", "standins"])
     staged.rename(prefix)
-    tally = check_headers(prefix)
+    tally.add(check_headers(prefix))
 
     properties = work / "properties"
     properties.mkdir()
