@@ -58,8 +58,9 @@ SENTROVA_API int ensure_path_mounted_at(const std::string& path, const std::stri
 // As ensure_path_mounted_at with an empty mount point.
 SENTROVA_API int ensure_path_mounted(const std::string& path);
 
-// Has the platform unmount the volume that serves `path`, once and without force. Returns 0 if it
-// is not mounted any more, else -1. See roots_ex.h for the one with force.
+// Has the platform unmount the volume that serves `path`, once and without force. Returns 0 if the
+// platform has done so or nothing is mounted there, else -1; of mounts stacked upon each other the
+// one on top is taken off. See roots_ex.h for the one with force.
 SENTROVA_API int ensure_path_unmounted(const std::string& path);
 
 // Mounts /tmp, /cache and /data as far as the table has rows for them and unmounts all other

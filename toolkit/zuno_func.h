@@ -14,9 +14,8 @@
 struct selabel_handle;
 
 // Static helpers of the rescue environment. Messages go to standard output, each line beginning
-// with
-// "[ZunoFunc]" and a level. No member keeps state, so any thread may call any of them at any time;
-// only the list behind __popen is shared, and it is locked.
+// with "[ZunoFunc]" and a level. No member keeps state, so any thread may call any of them at any
+// time; only the list behind __popen is shared, and it is locked.
 class SENTROVA_API ZunoFunc {
  public:
   // Process execution
@@ -40,9 +39,8 @@ class SENTROVA_API ZunoFunc {
 
   // Blocks until the child `pid` ends and stores its raw wait status in `*status` (not null). `cmd`
   // is a label for messages. Returns 0 if it exited with 0 or is no child (any longer), in which
-  // case
-  // `*status` is untouched; -1 if it exited otherwise, was killed by a signal, or the wait failed
-  // (a signal handler interrupted it, for one).
+  // case `*status` is untouched; -1 if it exited otherwise, was killed by a signal, or the wait
+  // failed (a signal handler interrupted it, for one).
   static int Wait_For_Child(pid_t pid, int* status, std::string cmd);
 
   // Looks for the end of the child `pid` at once and then every second, `timeout_seconds` times (a
@@ -278,6 +276,5 @@ SENTROVA_API FILE* __popen(const char* command, const char* mode);
 
 // Closes a stream from __popen, blocks until its command ends, through interruptions by signals,
 // and returns the raw wait status, or -1 if somebody else reaped the child. A stream that is not
-// from
-// __popen yields -1 and stays open.
+// from __popen yields -1 and stays open.
 SENTROVA_API int __pclose(FILE* stream);
