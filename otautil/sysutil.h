@@ -36,7 +36,8 @@ struct BlockMapData {
   //
   // Numbers are read as scanf reads them. White space around the whole is passed over, and so is
   // what follows the numbers of a line. The ranges hold exactly the blocks that the file needs, at
-  // most 2^32 - 1. Returns an empty map, with one error logged, on any failure.
+  // most 2^32 - 1; the text is at most 64 MiB long. Returns an empty map, with one error logged, on
+  // any failure.
   SENTROVA_API static BlockMapData ParseBlockMapFile(const std::string& path);
 };
 

@@ -1,8 +1,11 @@
-#include <android-base/file.h>
 #include <android-base/logging.h>
 #include <android-base/strings.h>
+#include <android-base/unique_fd.h>
+#include <fcntl.h>
 #include <stdio.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <limits>
 
 #include "otautil/sysutil.h"
@@ -11,6 +14,32 @@ namespace {
 
 // Device path, sizes and the number of ranges stand before the ranges.
 constexpr size_t kHeaderLines = 3;
+
+// Some three million ranges, and so many times those that a process may map (vm.max_map_count).
+// What is longer, or never ends, as a device can, must not take the memory.
+constexpr size_t kMaxMapBytes = 64 << 20;
+
+// Reads a whole file of any kind. Returns false with `errno` otherwise, EFBIG for one that is
+// longer than the limit.
+bool read_map(const std::string& path, std::string& content) {
+  android::base::unique_fd file;
+  do {
+    file.reset(open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  } while (file == -1 && errno == EINTR);
+  if (file == -1) {
+    return false;
+  }
+  char buffer[16384];
+  while (content.size() <= kMaxMapBytes) {
+    const ssize_t count = TEMP_FAILURE_RETRY(read(file.get(), buffer, sizeof(buffer)));
+    if (count <= 0) {
+      return count == 0;
+    }
+    content.append(buffer, static_cast<size_t>(count));
+  }
+  errno = EFBIG;
+  return false;
+}
 
 // Returns false, with an error logged, if the line does not hold two positive sizes.
 bool parse_sizes(const std::string& line, BlockMapData& map) {
@@ -76,7 +105,7 @@ bool parse_ranges(const std::vector<std::string>& lines, BlockMapData& map) {
 
 BlockMapData BlockMapData::ParseBlockMapFile(const std::string& path) {
   std::string content;
-  if (!android::base::ReadFileToString(path, &content, /*follow_symlinks=*/true)) {
+  if (!read_map(path, content)) {
     PLOG(ERROR) << "Failed to read " << path;
     return {};
   }

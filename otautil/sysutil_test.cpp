@@ -203,6 +203,7 @@ TEST_F(BlockMaps, FilesThatCannotBeMappedAreNamed) {
   const std::pair<std::string, std::string> cases[] = {
       {"", "Empty filename\n"},
       {"@", "Failed to read : No such file or directory\nMap of '@' failed\n"},
+      {"@/dev/zero", "Failed to read /dev/zero: File too large\nMap of '@/dev/zero' failed\n"},
       {"/nonexistent", "Unable to open '/nonexistent': No such file or directory\n"},
       {empty.path, std::string("Map of '") + empty.path + "' failed\n"},
       {fifo, "Map of '" + fifo + "' failed\n"},
