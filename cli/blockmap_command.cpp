@@ -10,7 +10,6 @@
 #include <unistd.h>
 
 #include <CLI/CLI.hpp>
-#include <algorithm>
 #include <cerrno>
 #include <cstdint>
 #include <memory>
@@ -105,20 +104,17 @@ void fail_on_unreadable_data() {
   sigaction(SIGBUS, &action, nullptr);
 }
 
-// A log message as a terminal can take it: the library quotes lines of the map, whatever they hold.
-std::string printable(const std::string& message) {
+// A log message of bearable length: the library quotes lines of the map, whatever they hold.
+std::string quote(const std::string& message) {
   constexpr size_t kMaxLength = 200;
-  std::string text = message.substr(0, kMaxLength);
-  std::replace_if(
-      text.begin(), text.end(), [](char c) { return c < ' ' || c > '~'; }, '?');
-  return text.size() < message.size() ? text + "..." : text;
+  return message.size() > kMaxLength ? message.substr(0, kMaxLength) + "..." : message;
 }
 
 // Maps a file by its map; otherwise `problem` is what the library logs about it.
 bool map_file(const std::string& map, MemMapping& mapping, std::string& problem) {
   android::base::SetLogger([&problem](auto, auto severity, auto, auto, auto, const char* text) {
     if (severity >= android::base::ERROR) {
-      problem += (problem.empty() ? "" : "; ") + printable(text);
+      problem += (problem.empty() ? "" : "; ") + quote(text);
     }
   });
   const bool is_mapped = mapping.MapBlockFile(map);
@@ -149,7 +145,7 @@ ExitStatus check_map(const Arguments& arguments, const Output& output) {
 
 void add_blockmap_command(CLI::App& app, const Output& output, int& status) {
   CLI::App* const command = app.add_subcommand(
-      "blockmap", "Write the map of the blocks that hold a file now, or read a file through one");
+      "blockmap", "Write the map of the blocks that hold a file, or read a file through one");
   // Shared with the callback, which outlives this function.
   const auto arguments = std::make_shared<Arguments>();
   command->add_option("file", arguments->file, "The file, or with --check a map")->required();

@@ -2,13 +2,26 @@
 
 namespace sentrova {
 
-// What the program tells its caller; the help text lists the same numbers.
+// What the program tells its caller.
 enum ExitStatus : int {
   kExitSuccess = 0,
-  kExitAnswerIsNo = 1,          // the question was answered, with no (a wrong password)
-  kExitUsage = 2,               // the command line or the input cannot be used
-  kExitServiceUnavailable = 3,  // the service was not reached, or died during the call
-  kExitServiceFailed = 4,       // the service was asked and could not do it
+  kExitAnswerIsNo = 1,
+  kExitUsage = 2,
+  kExitServiceUnavailable = 3,
+  kExitServiceFailed = 4,
+};
+
+// The one list of what they mean, from which the help text is made.
+struct ExitStatusMeaning {
+  ExitStatus status;
+  const char* meaning;
+};
+inline constexpr ExitStatusMeaning kExitStatusMeanings[] = {
+    {kExitSuccess, "done, or yes"},
+    {kExitAnswerIsNo, "no: the password is wrong, nothing was found, not ready, not confirmed"},
+    {kExitUsage, "the command line or the input cannot be used; nothing was changed"},
+    {kExitServiceUnavailable, "the service was not reached, or it died during the call"},
+    {kExitServiceFailed, "it was tried and could not be done"},
 };
 
 }  // namespace sentrova

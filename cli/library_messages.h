@@ -5,7 +5,7 @@
 namespace sentrova {
 
 // While one is alive, what the library writes to standard output goes to standard error, so that
-// standard output holds the answer alone. One at a time; for programs with one thread.
+// standard output holds the answer alone. One at a time, while no other thread writes there.
 class LibraryMessagesToStderr {
  public:
   LibraryMessagesToStderr();

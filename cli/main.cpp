@@ -1,95 +1,50 @@
+#include <android-base/logging.h>
+
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <cstdio>
 #include <exception>
+#include <nlohmann/json.hpp>
 #include <string>
+#include <string_view>
 
 #include "cli/blockmap_command.h"
-#include "cli/credential_commands.h"
 #include "cli/exit_status.h"
 #include "cli/output.h"
 #include "cli/power_commands.h"
 #include "cli/property_commands.h"
-#include "cli/status_command.h"
-#include "cli/unlock_command.h"
+#include "cli/service_commands.h"
+#include "cli/volume_commands.h"
 
 namespace {
 
 constexpr char kDescription[] =
-    "Asks the rescue service of this device about the owner's data and has it unlocked.";
-constexpr char kExitStatusHelp[] =
-    "Exit status: 0 done, or yes; 1 no (the password is wrong); 2 the command line or the input\n"
-    "cannot be used; 3 the service was not reached or died; 4 the service could not do it.\n"
-    "A password is asked for without echo on a terminal; otherwise it is the first line of\n"
-    "standard input.";
-constexpr char kUnlockHelp[] =
-    "Unlock the data step by step, asking for the password where one is set (three tries on a "
-    "terminal, one otherwise), and show what is readable then";
-constexpr char kMethodHelp[] =
-    "How the data is encrypted: fbe by file, fde the whole disk, auto as the device says";
+    "Asks the rescue service of this device about the owner's data and has it unlocked; looks\n"
+    "after the device's volumes.";
+constexpr char kVersion[] = "sentrova " SENTROVA_VERSION;
 
-struct PropertyVerb {
-  const char* name;
-  const char* help;
-  sentrova::ExitStatus (*command)(const sentrova::Output& output);
-};
-
-constexpr PropertyVerb kPropertyVerbs[] = {
-    {"load", "Load them from the vendor's partitions, else from the backups",
-     sentrova::load_properties},
-    {"backup", "Back up their files, or load the backups where they are not ready",
-     sentrova::back_up_properties},
-    {"clear", "Remove the backups", sentrova::clear_property_backups},
-    {"persist", "Load the persistent properties from the data partition",
-     sentrova::load_persistent_properties},
-};
-
-void add_property_verbs(CLI::App& app, const sentrova::Output& output, int& status) {
-  CLI::App* const properties =
-      app.add_subcommand("properties", "Load the vendor's properties, in this process");
-  properties->require_subcommand(1);
-  for (const PropertyVerb& verb : kPropertyVerbs) {
-    properties->add_subcommand(verb.name, verb.help)->callback([&] {
-      status = verb.command(output);
-    });
+std::string footer() {
+  std::string text = "Exit status:\n";
+  for (const auto& [status, meaning] : sentrova::kExitStatusMeanings) {
+    text += "  " + std::to_string(status) + "  " + meaning + "\n";
   }
+  return text +
+         "A password is asked for without echo on a terminal; otherwise it is the first line of\n"
+         "standard input. Every command takes --json. What the library logs goes to standard\n"
+         "error.";
 }
 
-int run(int argc, char** argv) {
-  CLI::App app(kDescription, "sentrova");
-  app.footer(kExitStatusHelp);
-  app.require_subcommand(1);
-  app.fallthrough();
-  int user_id = 0;
-  bool json = false;
-  app.add_option("--user", user_id, "The user id (0 is the owner)")->capture_default_str();
-  app.add_flag("--json", json, "Print one JSON object instead of text");
+// As the parser will find, but also where it fails before it comes to the option.
+bool asks_for_json(int argc, char** argv) {
+  return std::any_of(argv + 1, argv + std::max(argc, 1),
+                     [](const char* word) { return std::string_view(word) == "--json"; });
+}
 
-  const sentrova::Output output(json);
-  int status = sentrova::kExitSuccess;
-  app.add_subcommand("password-type", "Show what kind of credential locks the data")->callback([&] {
-    status = sentrova::show_password_type(user_id, output);
-  });
-  app.add_subcommand("verify", "Check a password")->callback([&] {
-    status = sentrova::verify_password(user_id, output);
-  });
-  app.add_subcommand("status",
-                     "Show the credential type, the encryption, the last unlock's result and what "
-                     "is mounted at /data")
-      ->callback([&] { status = sentrova::show_status(user_id, output); });
-  std::string method = sentrova::kMethodAuto;
-  CLI::App* unlock = app.add_subcommand("unlock", kUnlockHelp);
-  unlock->add_option("--method", method, kMethodHelp)
-      ->check(CLI::IsMember(
-          {sentrova::kMethodAuto, sentrova::kMethodFileBased, sentrova::kMethodFullDisk}))
-      ->capture_default_str();
-  unlock->callback([&] { status = sentrova::unlock_data(user_id, method, output); });
-  sentrova::add_power_commands(app, output, status);
-
-  add_property_verbs(app, output, status);
-  sentrova::add_blockmap_command(app, output, status);
-
+int parse(CLI::App& app, int argc, char** argv, const sentrova::Output& output) {
   try {
     app.parse(argc, argv);
+  } catch (const CLI::CallForVersion&) {
+    output.result(kVersion, {{"version", SENTROVA_VERSION}});
   } catch (const CLI::ExtrasError&) {
     // What was given is not repeated: it may be a password.
     output.error("an argument was not expected; passwords are never taken from the command line");
@@ -98,15 +53,39 @@ int run(int argc, char** argv) {
     if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::Success)) {
       return app.exit(error);  // help
     }
-    output.error(error.what());
+    output.error(app.get_subcommands().empty()
+                     ? "a command is missing or unknown; `sentrova --help` lists them"
+                     : error.what());
     return sentrova::kExitUsage;
   }
-  return status;
+  return sentrova::kExitSuccess;
+}
+
+int run(int argc, char** argv) {
+  CLI::App app(kDescription, "sentrova");
+  app.footer(footer());
+  app.require_subcommand(1);
+  app.fallthrough();
+  bool json = asks_for_json(argc, argv);
+  app.add_flag("--json", json, "Print one JSON object instead of text");
+  app.set_version_flag("--version", kVersion, "Show the version and exit");
+
+  const sentrova::Output output(json);
+  int status = sentrova::kExitSuccess;
+  sentrova::add_service_commands(app, output, status);
+  sentrova::add_volume_commands(app, output, status);
+  sentrova::add_property_commands(app, output, status);
+  sentrova::add_blockmap_command(app, output, status);
+  sentrova::add_power_commands(app, output, status);
+  const int parse_status = parse(app, argc, argv, output);
+  return parse_status != sentrova::kExitSuccess ? parse_status : status;
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
+  setvbuf(stdout, nullptr, _IOLBF, 0);  // what the library says meanwhile is seen as it comes
+  android::base::InitLogging(argv, android::base::StderrLogger);
   try {
     const int status = run(argc, argv);
     if (fflush(stdout) != 0 || ferror(stdout) != 0) {

@@ -1,7 +1,12 @@
 #include "cli/output.h"
 
+#include <sys/ioctl.h>
+#include <unistd.h>
+
 #include <cstdio>
 #include <nlohmann/json.hpp>
+
+#include "cli/printable.h"
 
 namespace sentrova {
 namespace {
@@ -11,10 +16,24 @@ std::string one_line(const nlohmann::json& object) {
   return object.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
 }
 
+size_t terminal_width() {
+  constexpr size_t kUsualWidth = 80;  // of a console that does not tell
+  winsize size = {};
+  return ioctl(STDOUT_FILENO, TIOCGWINSZ, &size) == 0 && size.ws_col > 0 ? size.ws_col
+                                                                         : kUsualWidth;
+}
+
 }  // namespace
 
 void Output::result(const std::string& text, const nlohmann::json& object) const {
   printf("%s\n", json_ ? one_line(object).c_str() : text.c_str());
+}
+
+void Output::result(const Table& table, const nlohmann::json& object) const {
+  const std::string text = to_terminal() ? table.aligned(terminal_width()) : table.tab_separated();
+  if (json_ || !text.empty()) {
+    result(text, object);
+  }
 }
 
 void Output::error(const std::string& text) const {
@@ -22,12 +41,20 @@ void Output::error(const std::string& text) const {
 }
 
 void Output::error(const std::string& text, const nlohmann::json& object) const {
-  fprintf(stderr, "sentrova: %s\n", text.c_str());
+  note(text);
   if (json_) {
     nlohmann::json with_error = object;
     with_error["error"] = text;
     printf("%s\n", one_line(with_error).c_str());
   }
+}
+
+void Output::note(const std::string& text) const {
+  fprintf(stderr, "sentrova: %s\n", printable(text).c_str());
+}
+
+bool Output::to_terminal() const {
+  return !json_ && isatty(STDOUT_FILENO) != 0;
 }
 
 void Output::progress(const std::string& text) const {

@@ -1,5 +1,9 @@
 #include "cli/power_commands.h"
 
+#include <android-base/logging.h>
+#include <stdio.h>
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
 #include <memory>
 #include <nlohmann/json.hpp>
@@ -20,6 +24,17 @@ ExitStatus shut_down(const std::string& reason, const Output& output) {
   return kExitSuccess;
 }
 
+// Does not return: init ends the device. There is no result to print, but where init cannot be
+// asked the library aborts, which is an error like others here.
+[[noreturn]] void reboot(const std::string& reason, const Output& output) {
+  android::base::SetAborter([&output](const char*) {
+    output.error("the device's init cannot be asked");
+    fflush(stdout);
+    _exit(kExitServiceFailed);
+  });
+  Reboot(reason);
+}
+
 CLI::App* add_command(CLI::App& app, const char* name, const char* description,
                       const std::shared_ptr<std::string>& reason, const char* reason_description) {
   CLI::App* const command = app.add_subcommand(name, description);
@@ -34,7 +49,7 @@ void add_power_commands(CLI::App& app, const Output& output, int& status) {
   const auto reason = std::make_shared<std::string>();
   add_command(app, "reboot", "Reboot the device", reason,
               "Where to, as recovery or bootloader; the system if left out")
-      ->callback([reason] { Reboot(*reason); });
+      ->callback([reason, &output] { reboot(*reason, output); });
   add_command(app, "shutdown", "Power the device off", reason, "Why, for the device's records")
       ->callback([reason, &output, &status] { status = shut_down(*reason, output); });
 }

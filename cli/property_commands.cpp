@@ -3,15 +3,17 @@
 #include <android-base/properties.h>
 #include <sys/stat.h>
 
+#include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 #include <string>
 
+#include "cli/exit_status.h"
 #include "cli/library_messages.h"
+#include "cli/progress.h"
 #include "recovery_utils/roots.h"
 #include "recovery_utils/roots_ex.h"
 
 namespace sentrova {
-
 namespace {
 
 constexpr char kBackupFolder[] = "/cache/recovery";
@@ -36,6 +38,7 @@ template <typename Call>
 bool with_volumes(const Output& output, Call call) {
   {
     const LibraryMessagesToStderr messages;
+    const Progress progress("waiting for the property loader");
     if (!get_fstab_default().empty()) {
       if (ensure_path_mounted("/cache") == 0) {
         mkdir(kBackupFolder, 0755);
@@ -61,8 +64,6 @@ ExitStatus show_vendor_properties(const Output& output) {
                 {{"oem_ready", oem}, {"kcf_ready", kcf}});
   return oem ? kExitSuccess : kExitAnswerIsNo;
 }
-
-}  // namespace
 
 ExitStatus load_properties(const Output& output) {
   return with_volumes(output, zuno_load_property) ? show_vendor_properties(output)
@@ -91,6 +92,34 @@ ExitStatus load_persistent_properties(const Output& output) {
       ready ? "the persistent properties are loaded" : "the persistent properties are not ready",
       {{"persistent_ready", ready}});
   return ready ? kExitSuccess : kExitAnswerIsNo;
+}
+
+struct PropertyVerb {
+  const char* name;
+  const char* help;
+  ExitStatus (*command)(const Output& output);
+};
+
+constexpr PropertyVerb kPropertyVerbs[] = {
+    {"load", "Load them from the vendor's partitions, else from the backups", load_properties},
+    {"backup", "Back up their files, or load the backups where they are not ready",
+     back_up_properties},
+    {"clear", "Remove the backups", clear_property_backups},
+    {"persist", "Load the persistent properties from the data partition",
+     load_persistent_properties},
+};
+
+}  // namespace
+
+void add_property_commands(CLI::App& app, const Output& output, int& status) {
+  CLI::App* const properties =
+      app.add_subcommand("properties", "Load the vendor's properties, in this process");
+  properties->require_subcommand(1);
+  for (const PropertyVerb& verb : kPropertyVerbs) {
+    properties->add_subcommand(verb.name, verb.help)->callback([&verb, &output, &status] {
+      status = verb.command(output);
+    });
+  }
 }
 
 }  // namespace sentrova

@@ -6,6 +6,8 @@
 
 #include <string>
 
+#include "cli/progress.h"
+
 namespace sentrova {
 namespace {
 
@@ -16,6 +18,7 @@ ServiceConnection unavailable(std::string error) {
 }  // namespace
 
 ServiceConnection connect_to_service() {
+  const Progress progress("waiting for the rescue service");
   const android::sp<android::IServiceManager> manager = android::defaultServiceManager();
   if (manager == nullptr) {
     return unavailable("no service manager answers (is /dev/binder there and servicemanager up?)");

@@ -55,7 +55,7 @@ nlohmann::json as_json(int32_t credential_type, const DeviceState& state) {
       {"metadata_encryption",
        state.metadata_encryption ? nlohmann::json(*state.metadata_encryption) : nlohmann::json()},
       {"decrypt_result", or_null(state.decrypt_result)},
-      {"data", data_as_json(state)}};
+      {"data", mount_as_json(state.data)}};
 }
 
 }  // namespace

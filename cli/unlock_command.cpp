@@ -4,7 +4,9 @@
 #include <unistd.h>
 
 #include <nlohmann/json.hpp>
+#include <optional>
 
+#include "cli/progress.h"
 #include "cli/service_client.h"
 #include "cli/unlock_sequence.h"
 
@@ -18,9 +20,14 @@ class OutputDialogue : public UnlockDialogue {
  public:
   explicit OutputDialogue(const Output& output) : output_(output) {}
 
-  void begin(const std::string& step_name) override { output_.progress(step_name + ": "); }
+  void begin(const std::string& step_name) override {
+    output_.progress(step_name + ": ");
+    // On a terminal the step's name stands before it.
+    progress_.emplace(output_.to_terminal() ? "" : step_name);
+  }
 
   void end(const UnlockStep& step) override {
+    progress_.reset();
     char seconds[32];
     snprintf(seconds, sizeof(seconds), " (%.2f s)\n", step.time.count());
     output_.progress(step.outcome + seconds);
@@ -38,6 +45,7 @@ class OutputDialogue : public UnlockDialogue {
 
  private:
   const Output& output_;
+  std::optional<Progress> progress_;  // of the step that is under way
   nlohmann::json steps_ = nlohmann::json::array();
 };
 
@@ -81,7 +89,7 @@ ExitStatus report(UnlockMethod method, const UnlockEnd& end, const nlohmann::jso
                                  {"steps", steps},
                                  {"readable", readable},
                                  {"decrypt_result", or_null(state.decrypt_result)},
-                                 {"data", data_as_json(state)}};
+                                 {"data", mount_as_json(state.data)}};
   const std::string text =
       std::string("readable now: ") + readable + "; /data: " + describe_data(state);
   if (end.error.empty()) {

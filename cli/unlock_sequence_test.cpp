@@ -141,7 +141,7 @@ TEST(UnlockSequence, FollowsWhatTheDeviceSays) {
   for (const auto& c : kDevices) {
     DeviceState state;
     state.crypto_type = c.type;
-    state.data = c.mounted ? std::optional(sentrova::DataMount()) : std::nullopt;
+    state.data = c.mounted ? std::optional(sentrova::Mount()) : std::nullopt;
     state.crypto_state = c.encrypted ? "encrypted" : "";
     EXPECT_EQ(sentrova::method_for(state), c.method)
         << c.type << " " << c.encrypted << " " << c.mounted;
