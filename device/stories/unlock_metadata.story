@@ -27,6 +27,9 @@ expect_output_contains "readable now: everything"
 expect_photograph_whole
 note_moment "data readable"
 expect_equal "the result property" success "$(result_property)"
+step "The volumes, which leaves /data open" sentrova volumes
+expect_output_contains "/dev/block/by-name/userdata$(printf '\t')/dev/block/dm-0"
+expect_photograph_whole
 
 expect_library_time_below_milliseconds 50
 expect_no_trace_of_password
