@@ -14,7 +14,7 @@ def run_script_tests() -> Tally:
     loader = unittest.TestLoader()
     suite = unittest.TestSuite(
         loader.loadTestsFromName(module_name(path))
-        for folder in ("scripts", "device")
+        for folder in ("cli", "device", "scripts")
         for path in sorted((ROOT / folder).rglob("*_test.py"))
     )
     result = unittest.TextTestRunner(stream=io.StringIO()).run(suite)

@@ -1,0 +1,199 @@
+"""The man page and the completions of sentrova, held against what the program itself says."""
+
+import os
+import re
+import subprocess
+import tempfile
+import unittest
+from functools import cache
+from pathlib import Path
+
+from scripts import building
+
+PROGRAM = building.BUILD / "native/cli/sentrova"
+CLI = building.ROOT / "cli"
+MAN_PAGE = CLI / "man/sentrova.8"
+
+BASH = r"""
+source "$1"
+shift
+[[ $(complete -p sentrova) == "complete -F _sentrova sentrova" ]] || exit 1
+compopt() { :; }
+COMP_WORDS=("$@") COMP_CWORD=$(($# - 1))
+_sentrova sentrova
+printf '%s\n' "${COMPREPLY[@]}"
+"""
+
+# Types each line of the file $2 and Tab into a shell; what it takes as matches goes to the file $3,
+# the lines' matches parted by a line "end".
+ZSH = r"""
+zmodload zsh/zpty
+zpty shell zsh -f -i
+zpty -w shell "fpath=($1 \$fpath); matches=$3; source $4"
+while IFS= read -r line; do
+  zpty -w -n shell $line$'\t'
+  zpty -r -m shell output '*<complete>*' || exit 1
+done <$2
+"""
+ZSH_SHELL = r"""
+autoload -U compinit && compinit -D -u
+compadd() {
+  if [[ ${@[1,(i)(-|--)]} != *-(O|A|D)\ * ]]; then
+    local -a __matches
+    builtin compadd -A __matches "$@"
+    (( $#__matches )) && print -rl -- $__matches >>$matches
+  fi
+  builtin compadd "$@"
+}
+capture() {
+  zle complete-word
+  print end >>$matches
+  BUFFER=
+  print '<complete>'
+}
+zle -N capture
+bindkey '^I' capture
+"""
+
+# The device's volumes, as the program lists them for another.
+VOLUMES = "/data\tf2fs\t/dev/block/sda1\t-\n/cache\text4\t-\t-\n/data2\text4\t-\t-\n"
+MOUNT_POINTS = {"/data", "/data2", "/cache"}
+NO_VOLUMES = 'echo /data; echo "no table" >&2; exit 4'
+
+# What a line is completed to, in a folder with the directory "one" and the file "other". Options do
+# not count: zsh offers them where an argument is not known.
+LINES: dict[str, set[str]] = {
+    "mount ": MOUNT_POINTS,
+    "unmount --force /d": {"/data", "/data2"},
+    "--user 10 --json holders /c": {"/cache"},
+    "--user=10 format --yes --from one /c": {"/cache"},
+    "mount /data ": set(),
+    "verify ": set(),
+    "format --from o": {"one"},
+    "format --from=o": {"one"},
+    "find o": set(),
+    "find name o": {"one"},
+    "blockmap o": {"one", "other"},
+    "blockmap -o o": {"one", "other"},
+    "unlock --method f": {"fbe", "fde"},
+    "unlock --method=a": {"auto"},
+    "unlock --user ": set(),
+    "properties load ": set(),
+    "reboot ": {"recovery", "bootloader"},
+}
+
+
+@cache
+def help_of(verb: str) -> str:
+    command = [str(PROGRAM), *verb.split(), "--help"]
+    return subprocess.run(command, capture_output=True, text=True, check=True).stdout
+
+
+def names_in(section: str, verb: str) -> set[str]:
+    """The first words of a section's lines, which may be several names."""
+    found = re.search(rf"^{section}:\n((?:  .*\n)+)", help_of(verb), re.MULTILINE)
+    lines = re.findall(r"^  (\S+)", found[1], re.MULTILINE) if found else []
+    return {name for line in lines for name in line.split(",")}
+
+
+def options_by_verb() -> dict[str, set[str]]:
+    """Each verb with its own options; "" with those that all of them take, and "properties" and
+    the like, which are no verbs by themselves, with none."""
+    options = {"": names_in("Options", "")}
+    waiting = [""]
+    for verb in waiting:  # which grows
+        for name in names_in("Subcommands", verb):
+            nested = f"{verb} {name}".strip()
+            options[nested] = names_in("Options", nested) - options[""]
+            waiting.append(nested)
+    return options
+
+
+def options_in_man_page() -> dict[str, set[str]]:
+    options: dict[str, set[str]] = {"": set()}
+    for line in re.findall(r"^\.It ((?:Cm|Fl) .*)", MAN_PAGE.read_text(), re.MULTILINE):
+        found = re.match(r"Cm ((?:[a-z][a-z-]* ?)+)", line)
+        names = options.setdefault(found[1].strip() if found else "", set())
+        names.update("--" + name for name in re.findall(r"Fl Fl (\S+)", line))
+        names.update("-" + name for name in re.findall(r"Fl (\w)\b", line))
+    return options
+
+
+class Shells:
+    """A folder to complete in, with a program that lists the volumes by the given commands."""
+
+    def __init__(self, folder: str, volumes: str) -> None:
+        self.folder, self.tools = Path(folder, "work"), Path(folder, "tools")
+        (self.folder / "one").mkdir(parents=True)
+        (self.folder / "other").touch()
+        self.tools.mkdir()
+        program = self.tools / "sentrova"
+        program.write_text(f'#!/bin/sh\n[ "$*" = volumes ] || exit 2\n{volumes}\n')
+        program.chmod(0o755)
+
+    def run(self, *command: object) -> str:
+        path = f"{self.tools}:{os.environ['PATH']}"
+        result = subprocess.run(
+            [str(part) for part in command], cwd=self.folder, env={"PATH": path, "TERM": "dumb"},
+            stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=60, check=True,
+        )
+        if result.stderr:
+            raise AssertionError(result.stderr)
+        return result.stdout
+
+    def bash(self, lines: list[str]) -> list[set[str]]:
+        found = []
+        for line in lines:
+            words = re.findall(r"=|[^ =]+|(?<= )$", f"sentrova {line}")
+            script = CLI / "completions/bash/sentrova"
+            found.append(set(self.run("bash", "-c", BASH, "bash", script, *words).split("\n")))
+        return [matches - {""} for matches in found]
+
+    def zsh(self, lines: list[str]) -> list[set[str]]:
+        typed, matches, shell = (self.tools / name for name in ("typed", "matches", "shell"))
+        typed.write_text("".join(f"sentrova {line}\n" for line in lines))
+        shell.write_text(ZSH_SHELL)
+        self.run("zsh", "-f", "-c", ZSH, "zsh", CLI / "completions/zsh", typed, matches, shell)
+        return [set(part.split("\n")) - {""} for part in matches.read_text().split("end\n")[:-1]]
+
+
+class CommandLine(unittest.TestCase):
+    maxDiff = None
+
+    @classmethod
+    def setUpClass(cls) -> None:
+        building.build_preset("native", "sentrova")
+
+    def check_completions(self, expected: dict[str, set[str]], volumes: str) -> None:
+        for shell in (Shells.bash, Shells.zsh):
+            with tempfile.TemporaryDirectory() as folder:
+                found = dict(zip(expected, shell(Shells(folder, volumes), list(expected))))
+            for line, matches in found.items():
+                if not line.endswith("-"):
+                    found[line] = {match for match in matches if not match.startswith("-")}
+            self.assertEqual(found, expected, shell.__name__)
+
+    def test_completions_know_all_verbs_and_options(self) -> None:
+        options = options_by_verb()
+        expected = {f"{verb} -".lstrip(): own | options[""] for verb, own in options.items()}
+        expected |= {f"{verb} ".lstrip(): names for verb in options
+                     if (names := names_in("Subcommands", verb))}
+        self.assertGreater(len(expected), 20)
+        self.check_completions(expected, "exit 2")
+
+    def test_completions_of_arguments(self) -> None:
+        self.check_completions(LINES, f"printf %s '{VOLUMES}'")
+        self.check_completions({"mount /": set(), "format ": set()}, NO_VOLUMES)
+
+    def test_man_page(self) -> None:
+        groups = {verb for verb in options_by_verb() if verb and names_in("Subcommands", verb)}
+        verbs = {verb: own for verb, own in options_by_verb().items() if verb not in groups}
+        self.assertEqual(options_in_man_page(), verbs)
+        statuses = re.findall(r"^\.It (\d)\n([^.]*)\.$", MAN_PAGE.read_text(), re.MULTILINE)
+        self.assertEqual(
+            {(status, " ".join(meaning.lower().split())) for status, meaning in statuses},
+            set(re.findall(r"^  (\d)  (.*)$", help_of(""), re.MULTILINE)),
+        )
+        lint = subprocess.run(["mandoc", "-T", "lint", "-W", "warning", str(MAN_PAGE)],
+                              capture_output=True, text=True, check=False)
+        self.assertEqual(lint.stdout + lint.stderr, "")
