@@ -19,7 +19,7 @@ struct ExitStatusMeaning {
 inline constexpr ExitStatusMeaning kExitStatusMeanings[] = {
     {kExitSuccess, "done, or yes"},
     {kExitAnswerIsNo, "no: the password is wrong, nothing was found, not ready, not confirmed"},
-    {kExitUsage, "the command line or the input cannot be used; nothing was changed"},
+    {kExitUsage, "the command line or the input cannot be used"},
     {kExitServiceUnavailable, "the service was not reached, or it died during the call"},
     {kExitServiceFailed, "it was tried and could not be done"},
 };
