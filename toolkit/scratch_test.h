@@ -4,9 +4,9 @@
 #include <gtest/gtest.h>
 #include <sys/stat.h>
 
-#include <cstddef>
 #include <filesystem>
 #include <iterator>
+#include <set>
 #include <string>
 
 namespace sentrova::toolkit {
@@ -14,7 +14,6 @@ namespace sentrova::toolkit {
 // A test with a directory of its own that fails if it leaves a descriptor open.
 class ScratchTest : public ::testing::Test {
  protected:
-  ScratchTest() : descriptors_before_(count_descriptors()) {}
   ~ScratchTest() override {
     EXPECT_EQ(count_descriptors(), descriptors_before_);
     std::error_code error;
@@ -24,8 +23,9 @@ class ScratchTest : public ::testing::Test {
   std::string root() const { return directory_.path; }
   std::string path(const std::string& name) const { return root() + "/" + name; }
 
-  std::string make_file(const std::string& name, const std::string& content) const {
-    std::filesystem::create_directories(std::filesystem::path(path(name)).parent_path());
+  // These make the folders above too.
+  std::string make_file(const std::string& name, const std::string& content = "") const {
+    make_directory(std::filesystem::path(name).parent_path());
     EXPECT_TRUE(android::base::WriteStringToFile(content, path(name))) << path(name);
     return path(name);
   }
@@ -37,21 +37,25 @@ class ScratchTest : public ::testing::Test {
     std::string content;
     return android::base::ReadFileToString(file, &content, true) ? content : "(unreadable)";
   }
-  static mode_t mode_of(const std::string& file) {
+  static struct stat status_of(const std::string& file) {
     struct stat info = {};
-    stat(file.c_str(), &info);
-    return info.st_mode & 07777;
+    EXPECT_EQ(stat(file.c_str(), &info), 0) << file;
+    return info;
   }
-  static bool exists(const std::string& file) {
-    return std::filesystem::exists(std::filesystem::symlink_status(file));
-  }
-  // "a/a/a/...", `levels` long.
-  static std::string deep_path(int levels) {
-    std::string deep = "a";
-    for (int level = 1; level < levels; ++level) {
-      deep += "/a";
+  static mode_t mode_of(const std::string& file) { return status_of(file).st_mode & 07777; }
+
+  // All that is below a directory: "folder/", "folder/file=content", "other" for what is neither.
+  static std::set<std::string> tree_of(const std::string& directory) {
+    std::set<std::string> tree;
+    for (const auto& entry : std::filesystem::recursive_directory_iterator(directory)) {
+      const std::string name = entry.path().lexically_relative(directory);
+      const auto type = entry.symlink_status().type();
+      tree.insert(type == std::filesystem::file_type::directory ? name + "/"
+                  : type == std::filesystem::file_type::regular
+                      ? name + "=" + content_of(entry.path())
+                      : name);
     }
-    return deep;
+    return tree;
   }
 
  private:
@@ -60,12 +64,8 @@ class ScratchTest : public ::testing::Test {
     return std::distance(begin(descriptors), end(descriptors));
   }
 
-  const std::ptrdiff_t descriptors_before_;
+  const std::ptrdiff_t descriptors_before_ = count_descriptors();
   TemporaryDir directory_;
 };
-
-// Names that a file system takes and careless code trips over.
-inline const std::string kAwkwardNames[] = {"two words", "line\nbreak", "\xff\xfe\x80",
-                                            "'quoted\"", "%s%n",        std::string(255, 'n')};
 
 }  // namespace sentrova::toolkit

@@ -20,32 +20,25 @@
 namespace {
 
 using sentrova::testing::CapturedStdout;
-using sentrova::testing::forbid_new_processes;
 using sentrova::testing::RepeatedInterruption;
 using sentrova::testing::ScopedSignalAction;
-using sentrova::testing::ScopedTmpfs;
 using sentrova::testing::SleepScript;
 using std::chrono::seconds;
 using std::chrono::steady_clock;
+using ::testing::Each;
 using ::testing::ElementsAre;
+using ::testing::HasSubstr;
 using ::testing::IsEmpty;
-using ::testing::SizeIs;
 
-constexpr int64_t kSecond = 1'000'000;
+// While it is not null, the signals that the code under test sends are noted there and go nowhere.
+std::vector<std::pair<pid_t, int>>* swallowed_kills = nullptr;
+
 constexpr int kUntouched = 12345;
-
-// While one is alive, signals that the code under test sends are noted and go nowhere.
-class SwallowedKills {
- public:
-  SwallowedKills() { current = this; }
-  ~SwallowedKills() { current = nullptr; }
-  SwallowedKills(const SwallowedKills&) = delete;
-  SwallowedKills& operator=(const SwallowedKills&) = delete;
-
-  static SwallowedKills* current;
-  std::vector<std::pair<pid_t, int>> kills;
-};
-SwallowedKills* SwallowedKills::current = nullptr;
+constexpr char kTooLong[] = "[ZunoFunc]I: tool took too long, killing process\n";
+constexpr char kKilled[] = "[ZunoFunc]I: Child process killed successfully\n";
+constexpr char kZombie[] =
+    "[ZunoFunc]I: Child process took too long to kill, may be a zombie process\n";
+constexpr char kNoChild[] = "[ZunoFunc]E: tool no child process exist\n";
 
 // Waits until the child has ended and leaves it to be reaped.
 void await_end(pid_t pid) {
@@ -53,9 +46,28 @@ void await_end(pid_t pid) {
   EXPECT_EQ(waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT), 0);
 }
 
-bool is_child(pid_t pid) {
-  siginfo_t info;
-  return waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOHANG | WNOWAIT) == 0;
+// What a wait with a time-out came to.
+struct Waited {
+  int result;
+  size_t sleeps;
+  int status;  // kUntouched if not set
+  std::string output;
+
+  bool operator==(const Waited&) const = default;
+  friend void PrintTo(const Waited& waited, std::ostream* stream) {
+    *stream << waited.result << " after " << waited.sleeps << " s with status " << waited.status
+            << ": " << waited.output;
+  }
+};
+
+Waited wait(
+    pid_t pid, int timeout_seconds, const std::function<void(size_t)>& on_sleep = [](size_t) {}) {
+  const SleepScript sleeps(on_sleep);
+  CapturedStdout output;
+  int status = kUntouched;
+  const int result = ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", timeout_seconds);
+  EXPECT_THAT(sleeps.microseconds(), Each(1'000'000));
+  return {result, sleeps.microseconds().size(), status, output.take()};
 }
 
 class Commands : public ::testing::Test {
@@ -71,71 +83,54 @@ class Commands : public ::testing::Test {
   }
 };
 
-TEST_F(Commands, RunThroughTheShellReportTheirEnd) {
-  struct Case {
+TEST_F(Commands, ReportTheirEnd) {
+  struct Row {
     const char* command;
     int result;
     const char* message;
   };
-  const Case cases[] = {
-      {"exit 0", 0, "[ZunoFunc]E: exit 0 process ended with RC=0\n"},
-      {"exit 3", -1, "[ZunoFunc]E: pid_error=exit 3 process ended with ERROR: 3\n"},
-      {"kill -9 $$", -1, "[ZunoFunc]E: pid_signal=kill -9 $$ process ended with signal: [9]\n"},
-      {"echo $0", 0, "sh\n[ZunoFunc]E: echo $0 process ended with RC=0\n"},
-  };
-  for (const Case& c : cases) {
+  for (const Row& row :
+       {Row{"echo $0", 0, "sh\n[ZunoFunc]E: echo $0 process ended with RC=0\n"},
+        Row{"exit 3", -1, "[ZunoFunc]E: pid_error=exit 3 process ended with ERROR: 3\n"},
+        Row{"kill -9 $$", -1,
+            "[ZunoFunc]E: pid_signal=kill -9 $$ process ended with signal: [9]\n"}}) {
     CapturedStdout output;
-    const int result = ZunoFunc::Exec_Cmd(c.command);
-    EXPECT_EQ(output.take(), c.message);
-    EXPECT_EQ(result, c.result) << c.command;
+    EXPECT_EQ(ZunoFunc::Exec_Cmd(row.command), row.result);
+    EXPECT_EQ(output.take(), row.message);
   }
-}
-
-TEST_F(Commands, WithoutAShellEndWith127) {
-  const ScopedTmpfs no_shell("/system");
+  const sentrova::testing::ScopedTmpfs no_shell("/system");
   CapturedStdout output;
-  EXPECT_EQ(ZunoFunc::Exec_Cmd("true"), -1);
   std::string result;
+  EXPECT_EQ(ZunoFunc::Exec_Cmd("true"), -1);
   EXPECT_EQ(ZunoFunc::Exec_Cmd("true", result), 127 << 8);
   EXPECT_EQ(output.take(), "[ZunoFunc]E: pid_error=true process ended with ERROR: 127\n");
-  EXPECT_EQ(result, "");
 }
 
-TEST_F(Commands, OutputIsAppendedPieceByPiece) {
+TEST_F(Commands, HaveTheirOutputAppendedPieceByPiece) {
   const std::string long_line(300, 'x');
-  struct Case {
-    std::string command;
-    std::string output;
+  struct Row {
+    std::string command, output;
     int status;
   };
-  const Case cases[] = {
-      {"echo $0", "sh\n", 0},
+  const Row rows[] = {
       {"printf 'no end'; exit 1", "no end", 256},
       {"echo before; kill -15 $$", "before\n", 15},
       {"echo " + long_line, long_line + "\n", 0},
-      {R"(printf 'a\0b\nc\n')", "ac\n", 0},  // what follows a NUL in a line is dropped
-      {R"(printf '\0\n\0\nc')", "c", 0},
+      {R"(printf 'a\0b\nc\n\0\nd')", "ac\nd", 0},  // what follows a NUL in a line is dropped
       {"exec >&-; sleep 0.1; exit 4", "", 4 << 8},
+      {"printf abc; sleep 0.2; echo def; exec >&-; sleep 0.1; exit 2", "abcdef\n", 2 << 8},
   };
-  for (const Case& c : cases) {
-    std::string result = "kept ";
-    EXPECT_EQ(ZunoFunc::Exec_Cmd(c.command, result), c.status) << c.command;
-    EXPECT_EQ(result, "kept " + c.output) << c.command;
-  }
-}
-
-TEST_F(Commands, OutputSurvivesInterruptedReads) {
   const RepeatedInterruption interruption;
-  std::string result;
-  EXPECT_EQ(
-      ZunoFunc::Exec_Cmd("printf abc; sleep 0.2; echo def; exec >&-; sleep 0.3; exit 2", result),
-      2 << 8);
-  EXPECT_EQ(result, "abcdef\n");
+  for (const Row& row : rows) {
+    std::string result = "kept ";
+    EXPECT_EQ(ZunoFunc::Exec_Cmd(row.command, result), row.status) << row.command;
+    EXPECT_EQ(result, "kept " + row.output) << row.command;
+  }
 }
 
 TEST_F(Commands, FailWhereNoProcessCanBeMade) {
   const auto fail = [] {
-    if (!forbid_new_processes()) {
+    if (!sentrova::testing::forbid_new_processes()) {
       return 2;
     }
     CapturedStdout output;
@@ -150,223 +145,127 @@ TEST_F(Commands, FailWhereNoProcessCanBeMade) {
   EXPECT_EXIT(_exit(fail()), ::testing::ExitedWithCode(0), "");
 }
 
-TEST(ArgumentList, EmptyStartsNothing) {
-  CapturedStdout output;
-  EXPECT_EQ(ZunoFunc::Exec_Cmd(std::vector<std::string>{}), -1);
-  EXPECT_EQ(output.take(), "");
-  EXPECT_EQ(waitpid(-1, nullptr, WNOHANG), -1);
-}
-
 TEST(ArgumentList, ReachesTheProgramAsItIs) {
   CapturedStdout output;
+  EXPECT_EQ(ZunoFunc::Exec_Cmd(std::vector<std::string>{}), -1);
   const pid_t pid = ZunoFunc::Exec_Cmd(std::vector<std::string>{
       "/bin/sh", "-c", R"(printf '<%s>' "$0" "$@")", "zero", "a b", "", "$HOME;'\"", "new\nline"});
-  ASSERT_GT(pid, 0);
-  int status = 0;
-  ASSERT_EQ(waitpid(pid, &status, 0), pid);
+  int status = kUntouched;
+  EXPECT_EQ(waitpid(pid, &status, 0), pid);
   EXPECT_EQ(status, 0);
   const std::string text = output.take();
-  EXPECT_THAT(text, ::testing::HasSubstr("<zero><a b><><$HOME;'\"><new\nline>"));
-  EXPECT_THAT(text,
-              ::testing::HasSubstr("[ZunoFunc]E: Exec_Cmd(): pid: " + std::to_string(pid) + "!\n"));
-}
+  EXPECT_THAT(text, HasSubstr("<zero><a b><><$HOME;'\"><new\nline>"));
+  EXPECT_THAT(text, HasSubstr("[ZunoFunc]E: Exec_Cmd(): pid: " + std::to_string(pid) + "!\n"));
 
-TEST(ArgumentList, AProgramThatCannotBeExecutedEndsWith1) {
   for (const char* program : {"/absent", "sh", ""}) {  // PATH is not searched
-    CapturedStdout output;
-    const pid_t pid = ZunoFunc::Exec_Cmd(std::vector<std::string>{program});
-    int status = 0;
-    ASSERT_EQ(waitpid(pid, &status, 0), pid);
+    CapturedStdout ignored;
+    const pid_t failed = ZunoFunc::Exec_Cmd(std::vector<std::string>{program});
+    EXPECT_EQ(waitpid(failed, &status, 0), failed);
     EXPECT_EQ(status, 1 << 8) << program;
   }
 }
 
-TEST_F(Commands, AnExitCodeIsNoFailureForTheWaitWithATimeOut) {
+TEST_F(Commands, AreLookedAfterEverySecondUntilTheTimeOut) {
   for (const char* command : {"exit 0", "exit 3"}) {
     const pid_t pid = start(command);
     await_end(pid);
-    const SleepScript sleeps;
-    CapturedStdout output;
-    int status = kUntouched;
-    EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "label", 0), 0) << command;
-    EXPECT_EQ(output.take(), "");
-    EXPECT_EQ(WEXITSTATUS(status), command[5] - '0');
-    EXPECT_THAT(sleeps.microseconds(), IsEmpty());
-    EXPECT_FALSE(is_child(pid));
+    EXPECT_EQ(wait(pid, 0), (Waited{0, 0, (command[5] - '0') << 8, ""}));
   }
-}
-
-TEST_F(Commands, AreLookedAfterEverySecondUntilTheTimeOut) {
   for (const int timeout_seconds : {3, 10, -1}) {
     const pid_t pid = start("exec sleep 10");
-    const SleepScript sleeps([&](size_t count) {
-      if (count == 3) {
+    const auto end_in_the_third_second = [&](size_t second) {
+      if (second == 3) {
         kill(pid, SIGTERM);
         await_end(pid);
       }
-    });
-    CapturedStdout output;
-    int status = 0;
-    EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", timeout_seconds), -1);
-    EXPECT_EQ(output.take(), "[ZunoFunc]E: pid_signal=tool process ended with signal: [15]\n");
-    EXPECT_THAT(sleeps.microseconds(), ElementsAre(kSecond, kSecond, kSecond));
-    EXPECT_FALSE(is_child(pid));
+    };
+    EXPECT_EQ(
+        wait(pid, timeout_seconds, end_in_the_third_second),
+        (Waited{-1, 3, SIGTERM, "[ZunoFunc]E: pid_signal=tool process ended with signal: [15]\n"}));
   }
 }
 
-TEST_F(Commands, ThatIgnoreEverythingAreKilledAfterTheTimeOutAndReaped) {
+TEST_F(Commands, AreKilledAfterTheTimeOutWhateverTheyIgnore) {
+  // Programs keep the signals ignored that their parent ignored.
+  const ScopedSignalAction no_term(SIGTERM, SIG_IGN);
+  const ScopedSignalAction no_interrupt(SIGINT, SIG_IGN);
   for (const size_t timeout_seconds : {size_t{0}, size_t{2}}) {
-    // Programs keep the signals ignored that their parent ignored.
-    const ScopedSignalAction no_term(SIGTERM, SIG_IGN);
-    const ScopedSignalAction no_interrupt(SIGINT, SIG_IGN);
-    const ScopedSignalAction no_hang_up(SIGHUP, SIG_IGN);
     const pid_t pid = start("exec sleep 10");
-    const SleepScript sleeps([&](size_t count) {
-      if (count == timeout_seconds + 2) {  // in the second second after the kill
+    const auto last_two_seconds = [&](size_t second) {
+      if (second == timeout_seconds + 1) {
         await_end(pid);
       }
-    });
-    CapturedStdout output;
-    int status = 0;
-    EXPECT_EQ(
-        ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", static_cast<int>(timeout_seconds)),
-        -1);
-    EXPECT_EQ(output.take(),
-              "[ZunoFunc]I: tool took too long, killing process\n"
-              "[ZunoFunc]I: Child process killed successfully\n");
-    EXPECT_GE(sleeps.microseconds().size(), timeout_seconds + 1);
-    EXPECT_LE(sleeps.microseconds().size(), timeout_seconds + 2);
-    EXPECT_EQ(WTERMSIG(status), SIGKILL);
-    EXPECT_FALSE(is_child(pid));
+    };
+    EXPECT_EQ(wait(pid, static_cast<int>(timeout_seconds), last_two_seconds),
+              (Waited{-1, timeout_seconds + 1, SIGKILL, kTooLong + std::string(kKilled)}));
+    EXPECT_EQ(waitpid(pid, nullptr, WNOHANG), -1);
   }
+  const pid_t reaped = start("exec sleep 10");  // by the host
+  EXPECT_EQ(wait(reaped, 0, [&](size_t) { EXPECT_EQ(waitpid(reaped, nullptr, 0), reaped); }),
+            (Waited{-1, 1, kUntouched, kTooLong + std::string(kKilled)}));
 }
 
-TEST_F(Commands, ThatIgnoreEverythingAreKilledInTimeWhileSignalsInterruptTheWait) {
-  const pid_t pid = start("trap '' TERM INT HUP QUIT; while :; do sleep 0.1; done");
-  ASSERT_GT(pid, 0);
+TEST_F(Commands, AreKilledInTimeWhileSignalsInterruptTheWait) {
+  const pid_t pid = start("exec sleep 10");
   const RepeatedInterruption interruption;
   CapturedStdout output;
   const auto begin = steady_clock::now();
-  int status = 0;
-  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "stubborn", 2), -1);
+  int status = kUntouched;
+  EXPECT_EQ(ZunoFunc::Wait_For_Child(pid, &status, "tool"), -1);
+  EXPECT_EQ(output.take(), "[ZunoFunc]E: tool Unexpected error " + std::to_string(EINTR) + "\n");
+  EXPECT_EQ(status, kUntouched);
+  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", 1), -1);
   const auto taken = steady_clock::now() - begin;
-  EXPECT_GE(taken, seconds(3));  // two of patience and one until the first look after the kill
-  EXPECT_LT(taken, seconds(5));
-  EXPECT_EQ(WTERMSIG(status), SIGKILL);
-  EXPECT_FALSE(is_child(pid));
+  EXPECT_GE(taken, seconds(2));  // one of patience and one until the first look after the kill
+  EXPECT_LT(taken, seconds(4));
+  EXPECT_EQ(status, SIGKILL);
 }
 
 TEST_F(Commands, ThatSurviveTheKillAreGivenUpAfterFiveSeconds) {
-  const pid_t pid = start("exec sleep 10");
-  {
-    const SwallowedKills swallowed;
-    const SleepScript sleeps;
-    CapturedStdout output;
-    int status = 0;
-    EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", 1), -1);
-    EXPECT_EQ(output.take(),
-              "[ZunoFunc]I: tool took too long, killing process\n"
-              "[ZunoFunc]I: Child process took too long to kill, may be a zombie process\n");
-    EXPECT_THAT(sleeps.microseconds(), SizeIs(1 + 5));
-    EXPECT_THAT(swallowed.kills, ElementsAre(std::pair(pid, SIGKILL)));
-
-    // The id of a failed fork stands for any child in the wait; the kernel would kill everybody.
-    CapturedStdout second_output;
-    EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(-1, &status, "tool", 0), -1);
-    EXPECT_THAT(swallowed.kills, SizeIs(1));
-  }
-  kill(pid, SIGKILL);
-  EXPECT_EQ(waitpid(pid, nullptr, 0), pid);
-}
-
-TEST_F(Commands, OfTheOwnGroupAreNotKilledTogetherWithTheirCaller) {
-  const auto wait_for_group = [] {
-    if (setpgid(0, 0) != 0) {
-      return 2;
-    }
+  const auto give_up = [] {
+    setpgid(0, 0);
     const pid_t pid = start("exec sleep 10");
-    CapturedStdout output;
-    const SleepScript sleeps;
-    int status = 0;
-    const bool gave_up = ZunoFunc::Wait_For_Child_Timeout(0, &status, "tool", 0) == -1;
-    const bool child_is_alive = waitpid(pid, nullptr, WNOHANG) == 0;
+    std::vector<std::pair<pid_t, int>> kills;
+    swallowed_kills = &kills;
+    const std::string output = kTooLong + std::string(kZombie);
+    EXPECT_EQ(wait(pid, 1), (Waited{-1, 1 + 5, kUntouched, output}));
+    // The id of a failed fork stands for any child in the wait; the kernel would kill everybody.
+    EXPECT_EQ(wait(-1, 0), (Waited{-1, 5, kUntouched, output}));
+    EXPECT_EQ(wait(0, 0), (Waited{-1, 5, kUntouched, output}));  // and its caller too
+    EXPECT_THAT(kills, ElementsAre(std::pair(pid, SIGKILL)));
+    swallowed_kills = nullptr;
     kill(pid, SIGKILL);
-    return gave_up && child_is_alive ? 0 : 1;
   };
-  EXPECT_EXIT(_exit(wait_for_group()), ::testing::ExitedWithCode(0), "");
+  EXPECT_EXIT((give_up(), _exit(HasFailure())), ::testing::ExitedWithCode(0), "");
 }
 
-TEST(WaitForChild, TakesAMissingChildForASuccess) {
-  const pid_t parent = getppid();
-  const SleepScript sleeps;
-  CapturedStdout output;
+TEST_F(Commands, ThatSomebodyElseReapsCountAsASuccess) {
+  EXPECT_EQ(wait(getppid(), 5), (Waited{0, 0, kUntouched, kNoChild}));
+  EXPECT_EQ(wait(-1, 5), (Waited{0, 0, kUntouched, kNoChild}));
   int status = kUntouched;
-  EXPECT_EQ(ZunoFunc::Wait_For_Child(parent, &status, "first"), 0);
-  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(parent, &status, "second", 5), 0);
-  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(-1, &status, "third", 5), 0);
-  EXPECT_EQ(output.take(),
-            "[ZunoFunc]E: first no child process exist\n"
-            "[ZunoFunc]E: second no child process exist\n"
-            "[ZunoFunc]E: third no child process exist\n");
+  CapturedStdout output;
+  EXPECT_EQ(ZunoFunc::Wait_For_Child(getppid(), &status, "tool"), 0);
   EXPECT_EQ(status, kUntouched);
-  EXPECT_THAT(sleeps.microseconds(), IsEmpty());
-}
-
-TEST_F(Commands, WhoseEndTheHostIgnoresCountAsReaped) {
   const ScopedSignalAction ignored(SIGCHLD, SIG_IGN);
-  {
-    CapturedStdout output;
-    EXPECT_EQ(ZunoFunc::Exec_Cmd("exit 3"), 0);
-    EXPECT_EQ(output.take(), "[ZunoFunc]E: exit 3 no child process exist\n");
-  }
+  EXPECT_EQ(ZunoFunc::Exec_Cmd("exit 3"), 0);
+  EXPECT_EQ(output.take(), kNoChild + std::string("[ZunoFunc]E: exit 3 no child process exist\n"));
   std::string result;
   EXPECT_EQ(ZunoFunc::Exec_Cmd("echo text; exit 3", result), -1);
   EXPECT_EQ(result, "text\n");
-
   const pid_t pid = start("exec sleep 10");
-  const SleepScript sleeps([&](size_t) {
+  const auto end = [&](size_t) {
     kill(pid, SIGKILL);
     EXPECT_EQ(waitpid(pid, nullptr, 0), -1);
-  });
-  CapturedStdout output;
-  int status = kUntouched;
-  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", 10), 0);
-  EXPECT_EQ(output.take(), "[ZunoFunc]E: tool no child process exist\n");
-  EXPECT_THAT(sleeps.microseconds(), SizeIs(1));
-}
-
-TEST_F(Commands, WhoseEndTheHostReapsDuringTheKillCountAsKilled) {
-  const pid_t pid = start("exec sleep 10");
-  const SleepScript sleeps([&](size_t) { EXPECT_EQ(waitpid(pid, nullptr, 0), pid); });
-  CapturedStdout output;
-  int status = 0;
-  EXPECT_EQ(ZunoFunc::Wait_For_Child_Timeout(pid, &status, "tool", 0), -1);
-  EXPECT_EQ(output.take(),
-            "[ZunoFunc]I: tool took too long, killing process\n"
-            "[ZunoFunc]I: Child process killed successfully\n");
-  EXPECT_THAT(sleeps.microseconds(), SizeIs(1));
-}
-
-TEST_F(Commands, AWaitThatASignalInterruptsIsAnUnexpectedError) {
-  const pid_t pid = start("exec sleep 10");
-  {
-    const RepeatedInterruption interruption;
-    CapturedStdout output;
-    int status = kUntouched;
-    EXPECT_EQ(ZunoFunc::Wait_For_Child(pid, &status, "tool"), -1);
-    EXPECT_EQ(output.take(), "[ZunoFunc]E: tool Unexpected error " + std::to_string(EINTR) + "\n");
-    EXPECT_EQ(status, kUntouched);
-  }
-  kill(pid, SIGKILL);
-  EXPECT_EQ(waitpid(pid, nullptr, 0), pid);
+  };
+  EXPECT_EQ(wait(pid, 10, end), (Waited{0, 1, kUntouched, kNoChild}));
 }
 
 }  // namespace
 
 // In place of the C library's, for the code under test.
 extern "C" SENTROVA_API int kill(pid_t pid, int signal) noexcept {
-  if (SwallowedKills::current != nullptr) {
-    SwallowedKills::current->kills.emplace_back(pid, signal);
+  if (swallowed_kills != nullptr) {
+    swallowed_kills->emplace_back(pid, signal);
     return 0;
   }
   return static_cast<int>(syscall(SYS_kill, pid, signal));
