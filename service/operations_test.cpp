@@ -5,10 +5,10 @@
 #include <sys/stat.h>
 #include <sys/wait.h>
 
+#include <climits>
 #include <filesystem>
 #include <functional>
 #include <string>
-#include <vector>
 
 #include "recovery_utils/roots_ex.h"
 #include "recovery_utils/roots_test.h"
@@ -44,13 +44,11 @@ int zuno_fs_mgr_do_mount_one(const std::string& path) {
 namespace {
 
 using android::SentrovaService;
-using sentrova::testing::fstab_row;
 
-class DecryptionOperations : public sentrova::testing::RootsTest {
+class Operations : public sentrova::testing::RootsTest {
  protected:
-  DecryptionOperations() {
+  Operations() {
     failing_event.clear();
-    credentials_.reset();
     credentials_.on_call = tell;
     credentials_.matches = [](const std::string& password) { return password == kPassword; };
     decryption_.metadata = [] { return tell("Decrypt_ME"); };
@@ -59,21 +57,24 @@ class DecryptionOperations : public sentrova::testing::RootsTest {
       return tell("Decrypt_User " + std::to_string(user_id) + " " + secret + (flag ? " 1" : " 0"));
     };
   }
-  ~DecryptionOperations() override {
+  ~Operations() override {
     credentials_.reset();
     decryption_.reset();
   }
 
-  // Returns what the operation and the world around it told, less the toolkit's part. The password
+  // Expects what the operation and the world around it tell, less the toolkit's part. The password
   // stands nowhere in the messages.
-  static std::string trace_of(const std::function<void()>& operation) {
+  void expect(const std::function<int32_t(SentrovaService&)>& operation, int32_t result,
+              const std::string& expected) {
+    int32_t actual = 12345;
     std::string trace;
-    for (const std::string& line : android::base::Split(output_of(operation), "\n")) {
+    for (const std::string& line :
+         android::base::Split(output_of([&] { actual = operation(*service_); }), "\n")) {
       EXPECT_TRUE(line.starts_with(">") || line.find(kPassword) == std::string::npos) << line;
       trace += line.starts_with("[ZunoFunc]") ? "" : line + "\n";
     }
-    trace.pop_back();  // what follows the last line's end is no line
-    return trace;
+    EXPECT_EQ(trace, expected + "\n");
+    EXPECT_EQ(actual, result);
   }
 
   FakeCredentialLibrary& credentials_ = FakeCredentialLibrary::instance();
@@ -81,6 +82,11 @@ class DecryptionOperations : public sentrova::testing::RootsTest {
   android::sp<SentrovaService> service_ = new SentrovaService();
 };
 
+// Whatever user is named, the owner's credential is asked about.
+constexpr auto kType = [](SentrovaService& s) { return s.getUserPassWordType(10); };
+constexpr auto kVerify = [](SentrovaService& s) { return s.verifyUserPassWord(10, kPassword); };
+constexpr auto kVerifyWrong = [](SentrovaService& s) { return s.verifyUserPassWord(10, ""); };
+constexpr auto kFullDisk = [](SentrovaService& s) { return s.fdeDecryptUser(10); };
 constexpr auto kMetadata = [](SentrovaService& s) { return s.fbeDecryptMetadata(); };
 constexpr auto kDeviceEncrypted = [](SentrovaService& s) { return s.fbeDecryptUserDe(10); };
 constexpr auto kRight = [](SentrovaService& s) { return s.fbeDecryptUserCe(10, kPassword, true); };
@@ -108,6 +114,9 @@ const struct {
   int32_t result;
   std::string trace;
 } kCases[] = {
+    {"", kType, 0, kManager + "> status\n" + kManagerGone},
+    {"", kVerify, 0, kManager + "> verify hunter2\n" + kManagerGone},
+    {"", kVerifyWrong, -1, kManager + "> verify \n" + kManagerGone},
     {"", kMetadata, 0, kKeystore + "> Decrypt_ME\n" + kSuccess},
     {"Decrypt_ME", kMetadata, -1, kKeystore + "> Decrypt_ME\n" + kFail},
     {"no metadata encryption", kMetadata, 0,
@@ -128,18 +137,27 @@ const struct {
     {"", kWrong, -1, kManager + "> verify hunter3\n" + kManagerGone},
 };
 
-TEST_F(DecryptionOperations, TellAskAndPublishInOrder) {
+TEST_F(Operations, TellAskAndPublishInOrder) {
   for (const auto& c : kCases) {
     SCOPED_TRACE(c.world + ": " + c.trace);
     failing_event = c.world;
     credentials_.lock_status = c.world == "credential" ? -1 : 0;
-    auto row = fstab_row("/dev/u", "/data", "f2fs");
+    auto row = sentrova::testing::fstab_row("/dev/u", "/data", "f2fs");
     row.fs_mgr_flags.file_encryption = true;
     row.metadata_key_dir = c.world == "no metadata encryption" ? "" : "/metadata/vold";
     set_table(c.world == "no row" ? android::fs_mgr::Fstab{} : android::fs_mgr::Fstab{row});
-    int32_t result = 12345;
-    EXPECT_EQ(trace_of([&] { result = c.operation(*service_); }), c.trace);
-    EXPECT_EQ(result, c.result);
+    expect(c.operation, c.result, c.trace);
+  }
+  EXPECT_TRUE(credentials_.storage_was_zero);
+}
+
+TEST_F(Operations, MapEveryLockStatus) {
+  const std::pair<int, int32_t> rows[] = {{1, 11}, {2, 12}, {3, 13},  {4, 2},
+                                          {5, 3},  {6, -1}, {-1, -1}, {INT_MIN, -1}};
+  credentials_.recording = false;
+  for (const auto& [lock_status, type] : rows) {
+    credentials_.lock_status = lock_status;
+    EXPECT_EQ(service_->getUserPassWordType(0), type) << "lock status " << lock_status;
   }
 }
 
@@ -149,28 +167,24 @@ void await_end_of_child() {
   EXPECT_EQ(waitid(P_ALL, 0, &info, WEXITED | WNOWAIT), 0);
 }
 
-TEST_F(DecryptionOperations, SucceedWithADaemonThatEndsInTimeWhateverItsExitCode) {
+TEST_F(Operations, SucceedWithADaemonThatEndsInTimeWhateverItsExitCode) {
   constexpr char kDaemon[] = "/system/bin/zuno_vold";
+  const std::string head = "[SentrovaService]I: [FDE] ";
+  const std::string success = head + "Success to execute " + kDaemon + " ...\n\n" + kSuccess;
+  const std::string fail = head + "Fail to execute " + kDaemon + " ...\n\n" + kFail;
   const sentrova::testing::ScopedTmpfs system("/system");
   std::filesystem::create_directories("/system/bin");
-  const auto expect_unlock = [&](const std::string& ending) {
-    SCOPED_TRACE(ending);
-    int32_t result = 12345;
-    const std::string trace = trace_of([&] { result = service_->fdeDecryptUser(10); });
-    EXPECT_EQ(trace, "[SentrovaService]I: [FDE] " + ending + " to execute " + kDaemon + " ...\n\n" +
-                         (ending == "Success" ? kSuccess : kFail));
-    EXPECT_EQ(result, ending == "Success" ? 0 : -1);
-  };
   const struct {
     std::string commands;
-    const char* ending;
+    bool succeeds;
     size_t seconds_until_it_ends;
-  } kDaemons[] = {{"", "Success", 1},  // it cannot be started
-                  {"exit $#", "Success", 10},
-                  {"exit 1", "Success", 10},
-                  {"kill -9 $$", "Fail", 1},
-                  {"kill -STOP $$", "Fail", 11}};  // until it is killed
+  } kDaemons[] = {{"", true, 1},  // it cannot be started
+                  {"exit $#", true, 10},
+                  {"exit 1", true, 10},
+                  {"kill -9 $$", false, 1},
+                  {"kill -STOP $$", false, 11}};  // until it is killed
   for (const auto& c : kDaemons) {
+    SCOPED_TRACE(c.commands);
     if (!c.commands.empty()) {
       ASSERT_TRUE(android::base::WriteStringToFile("#!/bin/sh\n" + c.commands + "\n", kDaemon));
       ASSERT_EQ(chmod(kDaemon, 0755), 0);
@@ -180,7 +194,7 @@ TEST_F(DecryptionOperations, SucceedWithADaemonThatEndsInTimeWhateverItsExitCode
         await_end_of_child();
       }
     });
-    expect_unlock(c.ending);
+    expect(kFullDisk, c.succeeds ? 0 : -1, c.succeeds ? success : fail);
     if (c.seconds_until_it_ends > 10) {
       EXPECT_EQ(sleeps.microseconds().size(), c.seconds_until_it_ends);
     }
@@ -188,7 +202,7 @@ TEST_F(DecryptionOperations, SucceedWithADaemonThatEndsInTimeWhateverItsExitCode
   }
   in_new_process([&] {
     ASSERT_TRUE(sentrova::testing::forbid_new_processes());
-    expect_unlock("Success");  // there is no child to wait for
+    expect(kFullDisk, 0, success);  // there is no child to wait for
   });
 }
 
