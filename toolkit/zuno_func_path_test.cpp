@@ -239,7 +239,8 @@ TEST_F(ZunoFuncPath, ListsAndMatchesWhatItCanLookAt) {
     return unlink(path(name == "one" ? "pair/two" : "pair/one").c_str()) == 0;
   };
   EXPECT_TRUE(ZunoFunc::GetMatchFileFromDir(path("pair"), names, delete_the_other));
-  EXPECT_THAT(names, SizeIs(1));
+  ASSERT_THAT(names, SizeIs(1));
+  EXPECT_THAT(tree_of(path("pair")), ElementsAre(names[0] + "="));
 }
 
 }  // namespace

@@ -6,10 +6,6 @@
 
 #include "binder/IInterface.h"
 
-#ifndef __GXX_RTTI
-#error "compile this file with run-time type information"
-#endif
-
 namespace android {
 namespace {
 
@@ -20,7 +16,7 @@ class INothing : public IInterface {
 
 class BpNothing : public BpInterface<INothing> {
  public:
-  explicit BpNothing(const sp<IBinder>& remote) : BpInterface(remote) {}
+  using BpInterface::BpInterface;
 };
 
 IMPLEMENT_META_INTERFACE(Nothing, "sentrova.test.INothing")
