@@ -46,15 +46,11 @@ class FsMgrDevice : public testing::Test {
   std::string target() const { return folder_.path; }
 
   // Reads an fstab of the one line: the volume, at the target.
-  bool read_row(const std::string& type_and_options, const std::string& fs_mgr,
-                const std::string& device) {
+  bool read_row(const std::string& device, const std::string& rest) {
     const TemporaryFile file;
-    return android::base::WriteStringToFile(
-               device + " " + target() + " " + type_and_options + " " + fs_mgr + "\n", file.path) &&
+    return android::base::WriteStringToFile(device + " " + target() + " " + rest + "\n",
+                                            file.path) &&
            ReadFstabFromFile(file.path, &fstab_);
-  }
-  bool read_row(const std::string& type_and_options, const std::string& fs_mgr) {
-    return read_row(type_and_options, fs_mgr, loop_.path());
   }
 
   // The rows of the mount table for the target: type and options.
@@ -77,7 +73,7 @@ class FsMgrDevice : public testing::Test {
 
 TEST_F(FsMgrDevice, AVolumeIsMountedWithTheRowsFlagsAndOptionsAndUnmounted) {
   ASSERT_TRUE(loop_.make_ext4());
-  ASSERT_TRUE(read_row("ext4 ro,noatime,nosuid,nodev,data=journal", "wait,check"));
+  ASSERT_TRUE(read_row(loop_.path(), "ext4 ro,noatime,nosuid,nodev,data=journal wait,check"));
   ASSERT_EQ(fs_mgr_do_mount_one(fstab_[0]), FS_MGR_DOMNT_SUCCESS) << strerror(errno);
   ASSERT_EQ(mounts().size(), 1U);
   EXPECT_THAT(android::base::Split(mounts()[0], " ,"),
@@ -99,7 +95,7 @@ TEST_F(FsMgrDevice, CheckRepairsAVolumeBeforeItIsMounted) {
   ASSERT_EQ(read_device(loop_.path(), kExt4StateOffset, 2), kStateClean);
   for (const bool check : {false, true}) {
     ASSERT_TRUE(write_device(loop_.path(), kExt4StateOffset, kStateWithErrors));
-    ASSERT_TRUE(read_row("ext4 defaults", check ? "check" : "defaults"));
+    ASSERT_TRUE(read_row(loop_.path(), check ? "ext4 defaults check" : "ext4 defaults defaults"));
     ASSERT_EQ(fs_mgr_do_mount_one(fstab_[0]), FS_MGR_DOMNT_SUCCESS);
     ASSERT_EQ(umount(target().c_str()), 0);
     EXPECT_EQ(read_device(loop_.path(), kExt4StateOffset, 2),
@@ -111,7 +107,7 @@ TEST_F(FsMgrDevice, AVolumeThatLooksEncryptedIsNotTouched) {
   ASSERT_TRUE(loop_.make_ext4());
   ASSERT_TRUE(write_device(loop_.path(), kExt4MagicOffset, std::string(2, '\x5a')));
   const std::string before = read_device(loop_.path(), 0, kVolumeBytes);
-  ASSERT_TRUE(read_row("ext4 defaults", "check,formattable"));
+  ASSERT_TRUE(read_row(loop_.path(), "ext4 defaults check,formattable"));
   EXPECT_FALSE(EnsurePathMounted(&fstab_, target()));
   EXPECT_EQ(errno, EINVAL);
   EXPECT_TRUE(read_device(loop_.path(), 0, kVolumeBytes) == before);
@@ -120,7 +116,7 @@ TEST_F(FsMgrDevice, AVolumeThatLooksEncryptedIsNotTouched) {
 TEST_F(FsMgrDevice, F2fsIsCheckedAndMountedUnlessItLooksEncrypted) {
   const LoopDevice volume(64 << 20);
   ASSERT_EQ(run_program({"/system/bin/make_f2fs", "-q", volume.path()}), 0);
-  ASSERT_TRUE(read_row("f2fs noatime", "check", volume.path()));
+  ASSERT_TRUE(read_row(volume.path(), "f2fs noatime check"));
   ASSERT_TRUE(EnsurePathMounted(&fstab_, target())) << strerror(errno);
   ASSERT_TRUE(EnsurePathUnmounted(&fstab_, target()));
 
@@ -133,7 +129,7 @@ TEST_F(FsMgrDevice, F2fsIsCheckedAndMountedUnlessItLooksEncrypted) {
 
 TEST_F(FsMgrDevice, ALogicalPartitionIsMountedFromItsMapping) {
   ASSERT_TRUE(loop_.make_ext4());
-  ASSERT_TRUE(read_row("ext4 ro", "logical,wait", kPartition));
+  ASSERT_TRUE(read_row(kPartition, "ext4 ro logical,wait"));
   EXPECT_FALSE(EnsurePathMounted(&fstab_, target())) << "not mapped";
   EXPECT_EQ(fstab_[0].blk_device, kPartition);
 

@@ -148,8 +148,14 @@ TEST_F(FstabReader, RefusesAMalformedLineAndNamesItAndKeepsTheTable) {
   android::base::SetLogger(android::base::StderrLogger);
 }
 
-TEST_F(FstabReader, SlotsGoToTheDevicesThatAskForThem) {
+TEST_F(FstabReader, SlotsFollowTheProperties) {
+  EXPECT_EQ(fs_mgr_get_slot_suffix() + fs_mgr_get_super_partition_name(), "super");
+  ASSERT_TRUE(SetProperty("ro.boot.slot", "a"));
+  EXPECT_EQ(fs_mgr_get_slot_suffix(), "_a");
   ASSERT_TRUE(SetProperty("ro.boot.slot_suffix", "_b"));
+  ASSERT_TRUE(SetProperty("ro.boot.super_partition", "store"));
+  EXPECT_EQ(fs_mgr_get_super_partition_name() + fs_mgr_get_super_partition_name(0),
+            "store_bstore_a");
   ASSERT_TRUE(
       read("/dev/block/by-name/boot /boot emmc defaults slotselect\n"
            "/dev/block/by-name/boot /other emmc defaults slotselect_other\n"
@@ -176,15 +182,6 @@ TEST_F(FstabReader, RefusesWhatIsNoTextFileOfReasonableSize) {
   }
   EXPECT_EQ(fstab_.size(), 1U);
   EXPECT_TRUE(read(line + std::string(256 * 1024 - line.size(), '\n')));
-}
-
-TEST_F(FstabReader, SlotNamesFollowTheProperties) {
-  EXPECT_EQ(fs_mgr_get_slot_suffix() + fs_mgr_get_super_partition_name(), "super");
-  ASSERT_TRUE(SetProperty("ro.boot.slot", "a"));
-  EXPECT_EQ(fs_mgr_get_slot_suffix(), "_a");
-  ASSERT_TRUE(SetProperty("ro.boot.super_partition", "store"));
-  EXPECT_EQ(fs_mgr_get_super_partition_name(), "store_a");
-  EXPECT_EQ(fs_mgr_get_super_partition_name(1), "store_b");
 }
 
 }  // namespace
