@@ -27,22 +27,16 @@ class Requests(unittest.TestCase):
             raise RuntimeError("Device 'stick' not found")
         return {}
 
-    def test_done_is_removed(self) -> None:
+    def test_done_is_removed_and_refused_kept_with_its_reason(self) -> None:
         self.assertEqual(self.serve("insert_sd", "plug_usb"), {})
         self.assertEqual([command for command, _ in self.commands],
                          ["blockdev-change-medium", "device_add"])
         self.assertEqual(self.commands[0][1]["filename"], str(self.folder / "sd.img"))
-
-    def test_refused_is_kept_with_its_reason_and_tried_once(self) -> None:
-        kept = {"unplug_usb.failed": "Device 'stick' not found\n"}
-        self.assertEqual(self.serve("unplug_usb"), kept)
+        kept = {"unplug_usb.failed": "Device 'stick' not found\n",
+                "open_pod_bay.failed": "there is no request open_pod_bay\n"}
+        self.assertEqual(self.serve("unplug_usb", "open_pod_bay"), kept)
         self.assertEqual(self.serve(), kept)
-        self.assertEqual(len(self.commands), 1)
-
-    def test_unknown(self) -> None:
-        self.assertEqual(self.serve("open_pod_bay"),
-                         {"open_pod_bay.failed": "there is no request open_pod_bay\n"})
-        self.assertEqual(self.commands, [])
+        self.assertEqual(len(self.commands), 3)
 
     def test_bytes_on_disk(self) -> None:
         disk = self.folder / "disk"

@@ -126,6 +126,7 @@ TEST(Time, DifferencesBorrowFromTheSecondsOrWrapAt32BitsOfMilliseconds) {
 
 TEST(Time, OfTodayIsLocalInItsForm) {
   const std::string outer_zone = getenv("TZ") != nullptr ? getenv("TZ") : "";
+  tzset();
   setenv("TZ", "XYZ-5:30", 1);  // five and a half hours ahead, so that UTC would show
   const time_t before = time(nullptr);
   const std::string date = ZunoFunc::Get_Current_Date();

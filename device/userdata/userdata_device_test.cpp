@@ -14,7 +14,6 @@
 #include "device/userdata/photograph.h"
 #include "device/userdata/provisioning.h"
 #include "device/userdata/sample_files.h"
-#include "device/zuno_vold/crypto_footer.h"
 #include "device/zunofscrypt/crypt_mapping.h"
 #include "device/zunofscrypt/key_file.h"
 #include "device/zunofscrypt/metadata_encryption.h"
@@ -43,7 +42,7 @@ class UserData : public ::testing::Test {
 
   // Also reads the fstab's row.
   bool provision(UserDataKind kind) {
-    const UserDataRequest request = {kind, file_system_, partition_.path(), digest_file_.path};
+    const UserDataRequest request = {kind, "f2fs", partition_.path(), digest_file_.path};
     const TemporaryFile fstab_file;
     Fstab fstab;
     if (!provision_user_data(places_, request, kSecret, error_) ||
@@ -55,8 +54,8 @@ class UserData : public ::testing::Test {
     return true;
   }
 
-  bool mount_device(const std::string& device) {
-    row_.blk_device = device;
+  bool mount_data() {
+    row_.blk_device = partition_.path();
     return fs_mgr_do_mount_one(row_, places_.data) == FS_MGR_DOMNT_SUCCESS;
   }
 
@@ -77,15 +76,10 @@ class UserData : public ::testing::Test {
     ReadFileToString(digest_file_.path, &line);
     return line;
   }
-  bool is_file_readable(const char* file) const {
-    return access((places_.data + file).c_str(), R_OK) == 0;
-  }
-
   std::string mapping() {
     return find_mapping(places_.mapping, error_).value_or("the kernel does not tell");
   }
 
-  std::string file_system_ = "f2fs";
   const LoopDevice partition_{kPartitionBytes};
   const TemporaryDir metadata_;
   const TemporaryDir data_;
@@ -95,43 +89,7 @@ class UserData : public ::testing::Test {
   std::string error_;
 };
 
-class UserDataOnBoth : public UserData, public ::testing::WithParamInterface<const char*> {
- protected:
-  UserDataOnBoth() { file_system_ = GetParam(); }
-};
-
-INSTANTIATE_TEST_SUITE_P(FileSystems, UserDataOnBoth, ::testing::Values("f2fs", "ext4"));
-
-TEST_P(UserDataOnBoth, BehindMetadataEncryptionOpensStepByStepAndLocksAgain) {
-  ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
-  EXPECT_NE(mount(partition_.path().c_str(), data_.path, GetParam(), 0, ""), 0);
-  for (int round = 0; round < 2; ++round) {
-    EXPECT_EQ(mapping(), "");
-    ASSERT_TRUE(unlock_metadata(places_, row_, error_)) << error_;
-    EXPECT_TRUE(unlock_metadata(places_, row_, error_)) << "again: " << error_;
-    EXPECT_FALSE(unlock_ce(kSecret)) << "too early";
-    EXPECT_THAT(error_, HasSubstr("the device-encrypted storage is locked"));
-    EXPECT_FALSE(is_file_readable(kAlarmsFile));
-    EXPECT_TRUE(unlock_de()) << error_;
-    EXPECT_TRUE(unlock_de()) << "again: " << error_;
-    EXPECT_TRUE(is_file_readable(kAlarmsFile));
-
-    EXPECT_FALSE(unlock_ce("wrong horse"));
-    EXPECT_FALSE(unlock_ce(kAbsentCredential));
-    EXPECT_EQ(photograph(), "");
-    EXPECT_TRUE(unlock_ce(kSecret)) << error_;
-    EXPECT_FALSE(unlock_ce("wrong horse")) << "it is open, but the secret is still wrong";
-    EXPECT_TRUE(unlock_ce(kSecret)) << error_;
-    EXPECT_EQ(photograph(), recorded_photograph());
-    EXPECT_NE(photograph(), "");
-    ASSERT_TRUE(lock()) << error_;
-  }
-  const std::string raw = read_device(partition_.path(), 0, kPartitionBytes);
-  EXPECT_EQ(raw.size(), size_t{kPartitionBytes});
-  EXPECT_EQ(raw.find(kPhotographComment), std::string::npos);
-}
-
-TEST_P(UserDataOnBoth, WhatIsInUseIsNotTakenAway) {
+TEST_F(UserData, WhatIsInUseIsNotTakenAway) {
   ASSERT_TRUE(provision(UserDataKind::kFileEncryptedWithMetadata)) << error_;
   ASSERT_TRUE(unlock_metadata(places_, row_, error_) && unlock_de() && unlock_ce(kSecret));
   unique_fd holder(open((places_.data + kPhotographFile).c_str(), O_RDONLY | O_CLOEXEC));
@@ -174,6 +132,9 @@ TEST_F(UserData, MissingAndDamagedKeysFailWithTheirNameAndChangeNothing) {
   const auto unlock = [this] {
     return unlock_metadata(places_, row_, error_) && unlock_de() && unlock_ce(kSecret);
   };
+  EXPECT_NE(mount(partition_.path().c_str(), data_.path, "f2fs", 0, ""), 0);
+  EXPECT_EQ(read_device(partition_.path(), 0, kPartitionBytes).find(kPhotographComment),
+            std::string::npos);
   const std::string metadata_key = metadata_key_path(row_);
   const struct {
     std::string path;
@@ -204,32 +165,22 @@ TEST_F(UserData, MissingAndDamagedKeysFailWithTheirNameAndChangeNothing) {
       ASSERT_TRUE(replace_file(path, kept.data(), kept.size(), error_)) << error_;
     }
   }
+  ASSERT_TRUE(unlock_metadata(places_, row_, error_) && unlock_de());
+  EXPECT_FALSE(unlock_ce("wrong horse") || unlock_ce(kAbsentCredential));
+  EXPECT_EQ(photograph(), "");
   EXPECT_TRUE(unlock());
+  EXPECT_FALSE(unlock_ce("wrong horse")) << "it is open, but the secret is still wrong";
   EXPECT_EQ(photograph(), recorded_photograph());
-}
-
-TEST_F(UserData, AKeyOfOtherFoldersIsNotLeftInTheKernel) {
-  ASSERT_TRUE(provision(UserDataKind::kFileEncrypted)) << error_;
-  ASSERT_TRUE(mount_device(partition_.path()));
-  MasterKey other;
-  ASSERT_TRUE(fill_randomly(other.data(), MasterKey::size()));
-  const std::optional<KeyIdentifier> identifier = add_key(places_.data, other, error_);
-  ASSERT_TRUE(identifier && remove_key(places_.data, *identifier, error_)) << error_;
-
-  EXPECT_FALSE(unlock_folders(places_.data, places_.de_folders(), other, error_));
-  EXPECT_EQ(has_key(places_.data, *identifier, error_), false) << error_;
-  EXPECT_FALSE(is_file_readable(kAlarmsFile));
-  EXPECT_TRUE(unlock_de() && unlock_ce(kSecret)) << error_;
-  EXPECT_EQ(photograph(), recorded_photograph());
+  EXPECT_NE(photograph(), "");
 }
 
 TEST_F(UserData, AMissingFolderKeepsNoOtherLockedButOneUnderAnotherKeyDoes) {
   ASSERT_TRUE(provision(UserDataKind::kFileEncrypted)) << error_;
-  ASSERT_TRUE(mount_device(partition_.path()) && unlock_de() && unlock_ce(kSecret)) << error_;
+  ASSERT_TRUE(mount_data() && unlock_de() && unlock_ce(kSecret)) << error_;
   const std::string folder = places_.ce_folders(0)[1];
   const std::optional<KeyIdentifier> de = read_policy(places_.de_folders()[0], error_);
   ASSERT_TRUE(de && std::filesystem::remove_all(folder) > 0) << error_;
-  ASSERT_TRUE(lock() && mount_device(partition_.path()) && unlock_de()) << error_;
+  ASSERT_TRUE(lock() && mount_data() && unlock_de()) << error_;
   EXPECT_TRUE(unlock_ce(kSecret)) << error_;
   EXPECT_EQ(photograph(), recorded_photograph());
 
@@ -245,25 +196,6 @@ TEST_F(UserData, AMappingThatWasLeftHalfMadeIsMadeAnew) {
             0);
   EXPECT_TRUE(unlock_metadata(places_, row_, error_)) << error_;
   EXPECT_NE(mapping(), "");
-}
-
-TEST_F(UserData, FullDiskEncryptionOpensWithTheKeyInTheFooter) {
-  file_system_ = "ext4";
-  ASSERT_TRUE(provision(UserDataKind::kFullDiskEncrypted)) << error_;
-  const int64_t footer = kPartitionBytes - static_cast<int64_t>(kFooterBytes);
-  const std::string kept = read_device(partition_.path(), footer, kFooterBytes);
-  ASSERT_TRUE(testing::write_device(partition_.path(), footer, std::string(64, 'x')));
-  EXPECT_FALSE(unlock_full_disk(places_.mapping, partition_.path(), error_));
-  EXPECT_THAT(error_, HasSubstr("not a wrapped key"));
-  EXPECT_EQ(mapping(), "");
-
-  ASSERT_TRUE(testing::write_device(partition_.path(), footer, kept));
-  ASSERT_TRUE(unlock_full_disk(places_.mapping, partition_.path(), error_)) << error_;
-  EXPECT_TRUE(unlock_full_disk(places_.mapping, partition_.path(), error_)) << "again: " << error_;
-  ASSERT_TRUE(mount_device(mapping()));
-  EXPECT_EQ(photograph(), recorded_photograph());
-  EXPECT_TRUE(lock()) << error_;
-  EXPECT_EQ(read_device(partition_.path(), footer, kFooterBytes), kept);
 }
 
 }  // namespace

@@ -20,12 +20,10 @@
 #include "binder/IServiceManager.h"
 #include "binder/Parcel.h"
 #include "binder/ProcessState.h"
-#include "platform/linux/binder/raw_client.h"
 
 namespace android {
 namespace {
 
-using sentrova::binder::RawClient;
 using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 
@@ -284,59 +282,6 @@ TEST_F(BinderDevice, TellsOfThePeersDeath) {
   ASSERT_NE(nullptr, peer_);
   expect_peer_answers();
   EXPECT_EQ(1, mourner->deaths);
-}
-
-std::string bytes_of(const Parcel& parcel) {
-  return {reinterpret_cast<const char*>(parcel.data()), parcel.dataSize()};
-}
-
-std::string object_of(uint32_t type, uint32_t handle) {
-  flat_binder_object object = {};
-  object.hdr.type = type;
-  object.handle = handle;
-  return {reinterpret_cast<const char*>(&object), sizeof(object)};
-}
-
-TEST_F(BinderDevice, DamagedRequestsAreAnsweredWithErrors) {
-  RawClient client;
-  ASSERT_TRUE(client.ok());
-  Parcel check;
-  check.writeInterfaceToken(IServiceManager::descriptor);
-  check.writeString16(kName);
-  const uint32_t peer =
-      client.call(0, IServiceManager::CHECK_SERVICE_TRANSACTION, bytes_of(check)).handle;
-  ASSERT_NE(0U, peer);
-
-  Parcel token;
-  begin(&token);
-  const std::string head = bytes_of(token);
-  const uint64_t end = head.size();
-  const std::string binder = head + object_of(BINDER_TYPE_HANDLE, peer);
-  const std::string foreign = head + object_of(BINDER_TYPE_HANDLE, 999);
-  const std::string closed = head + object_of(BINDER_TYPE_FD, 999);
-  const std::string endless("\0\0\0\0\0\0\0\0\xff\xff\xff\x7f", 12);
-  const struct {
-    const char* what;
-    std::string data;
-    std::vector<uint64_t> offsets;
-    uint32_t command;
-  } cases[] = {
-      {"nothing", "", {}, BR_REPLY},
-      {"endless name", endless, {}, BR_REPLY},
-      {"no binder", head, {}, BR_REPLY},
-      {"unlisted binder", binder, {}, BR_REPLY},
-      {"descriptor for binder", head + object_of(BINDER_TYPE_FD, 0), {end}, BR_REPLY},
-      {"foreign handle", foreign, {end}, BR_FAILED_REPLY},
-      {"closed descriptor", closed, {end}, BR_FAILED_REPLY},
-      {"offset outside", binder, {end + 4}, BR_FAILED_REPLY},
-  };
-  for (const auto& item : cases) {
-    SCOPED_TRACE(item.what);
-    const RawClient::Answer answer = client.call(peer, kHold, item.data, item.offsets);
-    EXPECT_EQ(item.command, answer.command);
-    EXPECT_EQ(item.command == BR_REPLY, answer.is_status);
-    expect_peer_answers();
-  }
 }
 
 }  // namespace

@@ -59,32 +59,6 @@ TEST_F(RemoteReferences, OneProxyAHandle) {
       << "before the reply is given back";
 }
 
-TEST_F(RemoteReferences, LocalObjectsAreHeldForTheDriver) {
-  wp<IBinder> watched;
-  binder_ptr_cookie named;
-  {
-    const sp<IBinder> object = new BBinder();
-    watched = object;
-    named = {reinterpret_cast<uintptr_t>(object->getWeakRefs()),
-             reinterpret_cast<uintptr_t>(object.get())};
-    kernel_.add_step(FakeDriver::returned(BR_INCREFS, named) +
-                     FakeDriver::returned(BR_ACQUIRE, named) +
-                     FakeDriver::returned(BR_ACQUIRE, binder_ptr_cookie{}));
-    serve_script();
-  }
-  EXPECT_NE(nullptr, watched.promote());
-  EXPECT_THAT(kernel_.codes(), ElementsAre(BC_ENTER_LOOPER, BC_INCREFS_DONE, BC_ACQUIRE_DONE,
-                                           BC_ACQUIRE_DONE, BC_EXIT_LOOPER));
-  const auto done = kernel_.written(BC_ACQUIRE_DONE)[0].as<binder_ptr_cookie>();
-  EXPECT_EQ(named.ptr, done.ptr);
-  EXPECT_EQ(named.cookie, done.cookie);
-  kernel_.add_step(FakeDriver::returned(BR_RELEASE, named) +
-                   FakeDriver::returned(BR_DECREFS, named));
-  kernel_.add_error(-EBADF);
-  serve_script();
-  EXPECT_EQ(nullptr, watched.promote());
-}
-
 // Makes a call of its own when it is destroyed.
 class LastWords : public BBinder {
  public:
@@ -206,7 +180,7 @@ TEST_F(RemoteReferences, SurviveTheRaceOfLastReleaseAndNewLookUp) {
 TEST_F(RemoteReferences, TellTheDriverOfTheEndOfAThread) {
   std::thread([] { EXPECT_NE(nullptr, proxy(5)); }).join();
   EXPECT_EQ(1, kernel_.threads_ended());
-  // A reference that outlives the thread's own conversation: told of once more.
+  // A reference that outlives the thread's own conversation is told of once more.
   std::thread([] {
     thread_local sp<IBinder> last_one;
     last_one = proxy(5);

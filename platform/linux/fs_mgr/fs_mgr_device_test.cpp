@@ -3,7 +3,6 @@
 #include <fs_mgr/roots.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <libdm/dm.h>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -15,9 +14,6 @@
 
 namespace {
 
-using android::dm::DeviceMapper;
-using android::dm::DmTable;
-using android::dm::DmTargetLinear;
 using android::fs_mgr::EnsurePathMounted;
 using android::fs_mgr::EnsurePathUnmounted;
 using android::fs_mgr::Fstab;
@@ -29,7 +25,6 @@ using sentrova::testing::write_device;
 using ::testing::IsSupersetOf;
 
 constexpr int64_t kVolumeBytes = 24 << 20;
-constexpr char kPartition[] = "fs_mgr_test";
 // Of an ext4 superblock: the state word, and its values (Documentation/filesystems/ext4).
 constexpr int64_t kExt4StateOffset = 1024 + 0x3a;
 constexpr int64_t kExt4MagicOffset = 1024 + 0x38;
@@ -46,6 +41,7 @@ class FsMgrDevice : public testing::Test {
   std::string target() const { return folder_.path; }
 
   // Reads an fstab of the one line: the volume, at the target.
+  bool read_row(const std::string& rest) { return read_row(loop_.path(), rest); }
   bool read_row(const std::string& device, const std::string& rest) {
     const TemporaryFile file;
     return android::base::WriteStringToFile(device + " " + target() + " " + rest + "\n",
@@ -73,7 +69,7 @@ class FsMgrDevice : public testing::Test {
 
 TEST_F(FsMgrDevice, AVolumeIsMountedWithTheRowsFlagsAndOptionsAndUnmounted) {
   ASSERT_TRUE(loop_.make_ext4());
-  ASSERT_TRUE(read_row(loop_.path(), "ext4 ro,noatime,nosuid,nodev,data=journal wait,check"));
+  ASSERT_TRUE(read_row("ext4 ro,noatime,nosuid,nodev,data=journal wait,check"));
   ASSERT_EQ(fs_mgr_do_mount_one(fstab_[0]), FS_MGR_DOMNT_SUCCESS) << strerror(errno);
   ASSERT_EQ(mounts().size(), 1U);
   EXPECT_THAT(android::base::Split(mounts()[0], " ,"),
@@ -95,7 +91,7 @@ TEST_F(FsMgrDevice, CheckRepairsAVolumeBeforeItIsMounted) {
   ASSERT_EQ(read_device(loop_.path(), kExt4StateOffset, 2), kStateClean);
   for (const bool check : {false, true}) {
     ASSERT_TRUE(write_device(loop_.path(), kExt4StateOffset, kStateWithErrors));
-    ASSERT_TRUE(read_row(loop_.path(), check ? "ext4 defaults check" : "ext4 defaults defaults"));
+    ASSERT_TRUE(read_row(check ? "ext4 defaults check" : "ext4 defaults defaults"));
     ASSERT_EQ(fs_mgr_do_mount_one(fstab_[0]), FS_MGR_DOMNT_SUCCESS);
     ASSERT_EQ(umount(target().c_str()), 0);
     EXPECT_EQ(read_device(loop_.path(), kExt4StateOffset, 2),
@@ -107,7 +103,7 @@ TEST_F(FsMgrDevice, AVolumeThatLooksEncryptedIsNotTouched) {
   ASSERT_TRUE(loop_.make_ext4());
   ASSERT_TRUE(write_device(loop_.path(), kExt4MagicOffset, std::string(2, '\x5a')));
   const std::string before = read_device(loop_.path(), 0, kVolumeBytes);
-  ASSERT_TRUE(read_row(loop_.path(), "ext4 defaults check,formattable"));
+  ASSERT_TRUE(read_row("ext4 defaults check,formattable"));
   EXPECT_FALSE(EnsurePathMounted(&fstab_, target()));
   EXPECT_EQ(errno, EINVAL);
   EXPECT_TRUE(read_device(loop_.path(), 0, kVolumeBytes) == before);
@@ -125,26 +121,6 @@ TEST_F(FsMgrDevice, F2fsIsCheckedAndMountedUnlessItLooksEncrypted) {
   const std::string before = read_device(volume.path(), 0, 4 << 20);
   EXPECT_FALSE(EnsurePathMounted(&fstab_, target()));
   EXPECT_TRUE(read_device(volume.path(), 0, 4 << 20) == before);
-}
-
-TEST_F(FsMgrDevice, ALogicalPartitionIsMountedFromItsMapping) {
-  ASSERT_TRUE(loop_.make_ext4());
-  ASSERT_TRUE(read_row(kPartition, "ext4 ro logical,wait"));
-  EXPECT_FALSE(EnsurePathMounted(&fstab_, target())) << "not mapped";
-  EXPECT_EQ(fstab_[0].blk_device, kPartition);
-
-  DmTable table;
-  table.Emplace<DmTargetLinear>(0U, uint64_t{kVolumeBytes / 512}, loop_.path(), 0U);
-  std::string path;
-  ASSERT_TRUE(
-      DeviceMapper::Instance().CreateDevice(kPartition, table, &path, std::chrono::seconds(5)));
-  EXPECT_TRUE(EnsurePathMounted(&fstab_, target()));
-  EXPECT_EQ(fstab_[0].blk_device, path);
-  EXPECT_EQ(mounts().size(), 1U);
-  EXPECT_FALSE(DeviceMapper::Instance().DeleteDevice(kPartition)) << "mounted";
-  EXPECT_EQ(errno, EBUSY);
-  EXPECT_TRUE(EnsurePathUnmounted(&fstab_, target()));
-  EXPECT_TRUE(DeviceMapper::Instance().DeleteDevice(kPartition));
 }
 
 }  // namespace
