@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <tuple>
 #include <vector>
 
 #include "common/export.h"
@@ -46,19 +47,9 @@ void await_end(pid_t pid) {
   EXPECT_EQ(waitid(P_PID, static_cast<id_t>(pid), &info, WEXITED | WNOWAIT), 0);
 }
 
-// What a wait with a time-out came to.
-struct Waited {
-  int result;
-  size_t sleeps;
-  int status;  // kUntouched if not set
-  std::string output;
-
-  bool operator==(const Waited&) const = default;
-  friend void PrintTo(const Waited& waited, std::ostream* stream) {
-    *stream << waited.result << " after " << waited.sleeps << " s with status " << waited.status
-            << ": " << waited.output;
-  }
-};
+// What a wait with a time-out came to: its result, the sleeps, the status (kUntouched if it was not
+// set) and the messages.
+using Waited = std::tuple<int, size_t, int, std::string>;
 
 Waited wait(
     pid_t pid, int timeout_seconds, const std::function<void(size_t)>& on_sleep = [](size_t) {}) {
@@ -169,7 +160,7 @@ TEST_F(Commands, AreLookedAfterEverySecondUntilTheTimeOut) {
   for (const char* command : {"exit 0", "exit 3"}) {
     const pid_t pid = start(command);
     await_end(pid);
-    EXPECT_EQ(wait(pid, 0), (Waited{0, 0, (command[5] - '0') << 8, ""}));
+    EXPECT_EQ(wait(pid, 0), Waited(0, 0, (command[5] - '0') << 8, ""));
   }
   for (const int timeout_seconds : {3, 10, -1}) {
     const pid_t pid = start("exec sleep 10");
@@ -181,7 +172,7 @@ TEST_F(Commands, AreLookedAfterEverySecondUntilTheTimeOut) {
     };
     EXPECT_EQ(
         wait(pid, timeout_seconds, end_in_the_third_second),
-        (Waited{-1, 3, SIGTERM, "[ZunoFunc]E: pid_signal=tool process ended with signal: [15]\n"}));
+        Waited(-1, 3, SIGTERM, "[ZunoFunc]E: pid_signal=tool process ended with signal: [15]\n"));
   }
 }
 
@@ -197,12 +188,12 @@ TEST_F(Commands, AreKilledAfterTheTimeOutWhateverTheyIgnore) {
       }
     };
     EXPECT_EQ(wait(pid, static_cast<int>(timeout_seconds), last_two_seconds),
-              (Waited{-1, timeout_seconds + 1, SIGKILL, kTooLong + std::string(kKilled)}));
+              Waited(-1, timeout_seconds + 1, SIGKILL, kTooLong + std::string(kKilled)));
     EXPECT_EQ(waitpid(pid, nullptr, WNOHANG), -1);
   }
   const pid_t reaped = start("exec sleep 10");  // by the host
   EXPECT_EQ(wait(reaped, 0, [&](size_t) { EXPECT_EQ(waitpid(reaped, nullptr, 0), reaped); }),
-            (Waited{-1, 1, kUntouched, kTooLong + std::string(kKilled)}));
+            Waited(-1, 1, kUntouched, kTooLong + std::string(kKilled)));
 }
 
 TEST_F(Commands, AreKilledInTimeWhileSignalsInterruptTheWait) {
@@ -228,10 +219,10 @@ TEST_F(Commands, ThatSurviveTheKillAreGivenUpAfterFiveSeconds) {
     std::vector<std::pair<pid_t, int>> kills;
     swallowed_kills = &kills;
     const std::string output = kTooLong + std::string(kZombie);
-    EXPECT_EQ(wait(pid, 1), (Waited{-1, 1 + 5, kUntouched, output}));
+    EXPECT_EQ(wait(pid, 1), Waited(-1, 1 + 5, kUntouched, output));
     // The id of a failed fork stands for any child in the wait; the kernel would kill everybody.
-    EXPECT_EQ(wait(-1, 0), (Waited{-1, 5, kUntouched, output}));
-    EXPECT_EQ(wait(0, 0), (Waited{-1, 5, kUntouched, output}));  // and its caller too
+    EXPECT_EQ(wait(-1, 0), Waited(-1, 5, kUntouched, output));
+    EXPECT_EQ(wait(0, 0), Waited(-1, 5, kUntouched, output));  // and its caller too
     EXPECT_THAT(kills, ElementsAre(std::pair(pid, SIGKILL)));
     swallowed_kills = nullptr;
     kill(pid, SIGKILL);
@@ -240,8 +231,8 @@ TEST_F(Commands, ThatSurviveTheKillAreGivenUpAfterFiveSeconds) {
 }
 
 TEST_F(Commands, ThatSomebodyElseReapsCountAsASuccess) {
-  EXPECT_EQ(wait(getppid(), 5), (Waited{0, 0, kUntouched, kNoChild}));
-  EXPECT_EQ(wait(-1, 5), (Waited{0, 0, kUntouched, kNoChild}));
+  EXPECT_EQ(wait(getppid(), 5), Waited(0, 0, kUntouched, kNoChild));
+  EXPECT_EQ(wait(-1, 5), Waited(0, 0, kUntouched, kNoChild));
   int status = kUntouched;
   CapturedStdout output;
   EXPECT_EQ(ZunoFunc::Wait_For_Child(getppid(), &status, "tool"), 0);
@@ -257,7 +248,7 @@ TEST_F(Commands, ThatSomebodyElseReapsCountAsASuccess) {
     kill(pid, SIGKILL);
     EXPECT_EQ(waitpid(pid, nullptr, 0), -1);
   };
-  EXPECT_EQ(wait(pid, 10, end), (Waited{0, 1, kUntouched, kNoChild}));
+  EXPECT_EQ(wait(pid, 10, end), Waited(0, 1, kUntouched, kNoChild));
 }
 
 }  // namespace

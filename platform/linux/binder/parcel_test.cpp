@@ -11,7 +11,7 @@
 #include <vector>
 
 #include "binder/Binder.h"
-#include "tests/support/allocation_count.h"
+#include "tests/support/freed_block.h"
 
 namespace android {
 namespace {

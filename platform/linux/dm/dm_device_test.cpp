@@ -33,8 +33,9 @@ class DeviceMapperTest : public testing::Test {
   DeviceMapperTest() { setenv("DM_DISABLE_UDEV", "1", 1); }
   ~DeviceMapperTest() override { mapper_.DeleteDeviceIfExists(kName); }
 
-  bool create_linear(uint64_t length, uint64_t physical_sector) {
+  bool create_linear(uint64_t length, uint64_t physical_sector, bool read_only = false) {
     DmTable table;
+    table.set_readonly(read_only);
     table.Emplace<DmTargetLinear>(0U, length, loop_.path(), physical_sector);
     return mapper_.CreateDevice(kName, table, &path_, seconds(5));
   }
@@ -77,6 +78,8 @@ TEST_F(DeviceMapperTest, ADeviceIsMadeFoundSuspendedAndRemoved) {
   EXPECT_TRUE(mapper_.DeleteDevice(kName));
   EXPECT_EQ(mapper_.GetState(kName), DmDeviceState::INVALID);
   EXPECT_NE(access(path_.c_str(), F_OK), 0);
+  ASSERT_TRUE(create_linear(kSectors, 0, true));
+  EXPECT_FALSE(write_device(path_, 0, "read-only"));
 }
 
 TEST_F(DeviceMapperTest, WhatTheKernelRefusesLeavesItsReasonAndNothingElse) {

@@ -71,7 +71,7 @@ TEST_F(Properties, WrittenAtOnceNeverShowAMixedValue) {
 }
 
 TEST_F(Properties, ReadOnlyKeepTheFirstValueEvenAnEmptyOne) {
-  constexpr int kNames = 500;
+  constexpr int kNames = 60;
   EXPECT_EQ(4, count_of_true(4, [&](int writer) {
               for (int i = 0; i < kNames; ++i) {
                 const std::string name = "ro.race." + std::to_string(i);

@@ -2,7 +2,6 @@
 
 #include <android-base/file.h>
 #include <android-base/properties.h>
-#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <stdlib.h>
@@ -10,7 +9,6 @@
 #include <unistd.h>
 
 #include <cerrno>
-#include <fstream>
 
 namespace sentrova {
 namespace {
@@ -50,29 +48,6 @@ TEST_F(PropertyWatcherTest, TellsEachChangedNameOnceAndNoTemporaryFile) {
   EXPECT_THAT(watcher->wait(10s)->names, ElementsAre("sys.powerctl"));
   EXPECT_LT(std::chrono::steady_clock::now() - start, 5s);
   wait(nullptr);
-}
-
-TEST_F(PropertyWatcherTest, LostChangesAskForARescan) {
-  std::optional<PropertyWatcher> watcher = PropertyWatcher::create();
-  ASSERT_TRUE(watcher);
-  int queue_length = 0;
-  std::ifstream("/proc/sys/fs/inotify/max_queued_events") >> queue_length;
-  if (queue_length <= 0 || queue_length > 100000) {
-    GTEST_SKIP() << "the kernel's queue of " << queue_length << " events is not to be filled here";
-  }
-  const std::string path = folder_.path + std::string("/test.flood");
-  for (int i = 0; i <= queue_length / 2; ++i) {
-    const android::base::unique_fd fd(open(path.c_str(), O_CREAT | O_RDONLY | O_CLOEXEC, 0600));
-    ASSERT_TRUE(fd.ok());
-    ASSERT_EQ(0, unlink(path.c_str()));
-  }
-  bool rescan = false;
-  for (int reads = 0; !rescan && reads < queue_length; ++reads) {
-    rescan = watcher->wait(0ms)->rescan;
-  }
-  EXPECT_TRUE(rescan);
-  ASSERT_TRUE(SetProperty("test.after", "v"));
-  EXPECT_THAT(watcher->wait(0ms)->names, ElementsAre("test.after"));
 }
 
 }  // namespace

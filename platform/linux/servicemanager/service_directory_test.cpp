@@ -2,19 +2,14 @@
 
 #include <gtest/gtest.h>
 
-#include <random>
 #include <string>
 #include <vector>
-
-#include "binder/Parcel.h"
 
 namespace sentrova {
 namespace {
 
 using android::BBinder;
 using android::IBinder;
-using android::IServiceManager;
-using android::Parcel;
 using android::sp;
 using android::status_t;
 using android::String16;
@@ -48,9 +43,6 @@ class Mortal : public BBinder {
 
 class ServiceDirectoryTest : public testing::Test {
  protected:
-  status_t call(uint32_t code, const Parcel& data, Parcel* reply) {
-    return IServiceManager::asBinder(directory_)->transact(code, data, reply);
-  }
   status_t add(const String16& name, const sp<IBinder>& service) {
     return directory_->addService(name, service, false, 0);
   }
@@ -104,29 +96,6 @@ TEST_F(ServiceDirectoryTest, ForgetsTheDeadButNotTheirSuccessors) {
   EXPECT_EQ(android::BAD_VALUE, add(name, first)) << "a dead service is not entered";
   EXPECT_EQ(second, directory_->checkService(name));
   second->die();
-  EXPECT_EQ(0U, directory_->listServices(0).size());
-}
-
-TEST_F(ServiceDirectoryTest, SurvivesAnyParcel) {
-  std::mt19937 random(20);
-  for (int round = 0; round < 4000; ++round) {
-    Parcel data;
-    const bool right_token = round % 4 != 0;
-    data.writeInterfaceToken(right_token ? IServiceManager::descriptor : String16("other"));
-    const size_t count = random() % 12;
-    for (size_t i = 0; i < count; ++i) {
-      data.writeUint32(random() % 3 == 0 ? static_cast<uint32_t>(random()) : random() % 8);
-    }
-    Parcel reply;
-    const auto code = static_cast<uint32_t>(random() % 6);
-    const status_t status = call(code, data, &reply);
-    const bool adds = code == IServiceManager::ADD_SERVICE_TRANSACTION;
-    EXPECT_FALSE(adds && status == android::OK) << "there was no object in it";
-    if (!right_token && code >= 1 && code <= 4) {
-      EXPECT_EQ(android::PERMISSION_DENIED, status) << code;
-      EXPECT_EQ(0U, reply.dataSize());
-    }
-  }
   EXPECT_EQ(0U, directory_->listServices(0).size());
 }
 

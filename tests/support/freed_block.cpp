@@ -1,7 +1,6 @@
-#include "tests/support/allocation_count.h"
+#include "tests/support/freed_block.h"
 
-#include <malloc.h>
-#include <string.h>
+#include <stdint.h>
 
 #include <algorithm>
 
@@ -16,13 +15,8 @@
 namespace sentrova {
 namespace {
 
-thread_local size_t blocks_taken = 0;
 thread_local const void* watched_block = nullptr;
 thread_local FreedBlock::State watched_state = FreedBlock::kNotFreed;
-
-void note_taken() {
-  ++blocks_taken;
-}
 
 void note_freed(const volatile void* block) {
   if (block == nullptr || block != watched_block)
@@ -35,12 +29,6 @@ void note_freed(const volatile void* block) {
 }
 
 }  // namespace
-
-AllocationCount::AllocationCount() : start_(blocks_taken) {}
-
-size_t AllocationCount::since_start() const {
-  return blocks_taken - start_;
-}
 
 FreedBlock::FreedBlock(const void* block) {
   watched_block = block;
@@ -63,33 +51,14 @@ FreedBlock::State FreedBlock::state() const {
 
 namespace {
 [[maybe_unused]] const int hooks_installed = __sanitizer_install_malloc_and_free_hooks(
-    [](const volatile void*, size_t) { sentrova::note_taken(); },
-    [](const volatile void* block) { sentrova::note_freed(block); });
+    nullptr, [](const volatile void* block) { sentrova::note_freed(block); });
 }  // namespace
 
 #else
 
 // The C library's own allocator under the names that it gives to those who replace its front.
 extern "C" {
-void* __libc_malloc(size_t size);
-void* __libc_calloc(size_t count, size_t size);
-void* __libc_realloc(void* block, size_t size);
 void __libc_free(void* block);
-
-void* malloc(size_t size) {
-  sentrova::note_taken();
-  return __libc_malloc(size);
-}
-
-void* calloc(size_t count, size_t size) {
-  sentrova::note_taken();
-  return __libc_calloc(count, size);
-}
-
-void* realloc(void* block, size_t size) {
-  sentrova::note_taken();
-  return __libc_realloc(block, size);
-}
 
 void free(void* block) {
   sentrova::note_freed(block);
