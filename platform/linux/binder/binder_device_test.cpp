@@ -9,6 +9,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <atomic>
 #include <chrono>
 #include <mutex>
@@ -166,6 +167,8 @@ class BinderDevice : public testing::Test {
 
 TEST_F(BinderDevice, ServicesAreFoundByName) {
   EXPECT_EQ(nullptr, manager_->checkService(String16("test.nobody")));
+  const Vector<String16> names = manager_->listServices();
+  EXPECT_NE(names.end(), std::find(names.begin(), names.end(), kName));
   EXPECT_EQ(kInterface, peer_->getInterfaceDescriptor());
   EXPECT_EQ(OK, peer_->pingBinder());
   EXPECT_EQ(0, Process("--add-as-ordinary-user", nullptr).wait()) << "only root and system add";
