@@ -23,10 +23,10 @@ unique_fd file_with(const std::string& content) {
 TEST(PasswordLine, IsTakenWithoutItsEnd) {
   const std::string longest(sentrova::kMaxPasswordBytes, 'x');
   const std::pair<std::string, std::string> table[] = {{"secret\n", "secret"},
-                                                     {" two words \r\n", " two words \r"},
-                                                     {"\n", ""},
-                                                     {"first\nrest", "first"},
-                                                     {longest + "\n", longest}};
+                                                       {" two words \r\n", " two words \r"},
+                                                       {"\n", ""},
+                                                       {"first\nrest", "first"},
+                                                       {longest + "\n", longest}};
   for (const auto& [input, password] : table) {
     const unique_fd fd = file_with(input);
     const PasswordInput read = sentrova::read_password_line(fd.get());
