@@ -152,13 +152,14 @@ TEST_F(RemoteTest, SurvivesAHostileDriver) {
     Damage damage;
   } cases[] = {
       {"offset that wraps", two_objects, {UINT64_MAX - 3}, none},
-      {"object over the end", two_objects, {28}, none},
+      {"object over the end", words({1, 2}) + two_objects.substr(0, 20), {8}, none},
       {"misaligned offset", two_objects, {2}, none},
       {"overlapping objects", two_objects, {0, 4}, none},
       {"unknown type", words({1, 2, 3, 4, 5, 6}), {0}, none},
       {"half an offset", two_objects, {0}, [](auto* t) { t->offsets_size = 4; }},
       {"offsets outside the area", two_objects, {0}, [](auto* t) { t->data.ptr.offsets = 8; }},
       {"endless offsets", two_objects, {0}, [](auto* t) { t->offsets_size = UINT64_MAX - 7; }},
+      {"data over the area's end", two_objects, {}, [](auto* t) { t->data_size = 1U << 20; }},
       {"data that wraps", two_objects, {}, [](auto* t) { t->data_size = UINT64_MAX; }},
       {"data outside the area", two_objects, {}, [](auto* t) { t->data.ptr.buffer = 0; }},
   };
