@@ -50,8 +50,10 @@ FreedBlock::State FreedBlock::state() const {
 #include <sanitizer/allocator_interface.h>
 
 namespace {
+// The sanitizer installs both hooks or none.
 [[maybe_unused]] const int hooks_installed = __sanitizer_install_malloc_and_free_hooks(
-    nullptr, [](const volatile void* block) { sentrova::note_freed(block); });
+    [](const volatile void*, size_t) {},
+    [](const volatile void* block) { sentrova::note_freed(block); });
 }  // namespace
 
 #else

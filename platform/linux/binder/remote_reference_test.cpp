@@ -145,10 +145,12 @@ TEST_F(RemoteReferences, ADeadManagersProxyIsNotHandedOutAgain) {
   const sp<IBinder> first = ProcessState::self()->getStrongProxyForHandle(0);
   kernel_.add_step(FakeDriver::returned(BR_NOOP) + FakeDriver::returned(BR_DEAD_REPLY));
   EXPECT_EQ(DEAD_OBJECT, first->pingBinder());
+  const size_t released = kernel_.written(BC_RELEASE).size();
   const sp<IBinder> second = ProcessState::self()->getStrongProxyForHandle(0);
   EXPECT_NE(first, second);
   EXPECT_TRUE(second->isBinderAlive());
   EXPECT_EQ(second, ProcessState::self()->getStrongProxyForHandle(0));
+  EXPECT_THAT(kernel_.written(BC_RELEASE), SizeIs(released + 1));
 }
 
 TEST_F(RemoteReferences, SurviveTheRaceOfLastReleaseAndNewLookUp) {
