@@ -29,7 +29,6 @@ using std::chrono::steady_clock;
 using ::testing::Each;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 
 // While it is not null, the signals that the code under test sends are noted there and go nowhere.
 std::vector<std::pair<pid_t, int>>* swallowed_kills = nullptr;

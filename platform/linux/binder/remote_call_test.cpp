@@ -154,6 +154,7 @@ TEST_F(RemoteTest, SurvivesAHostileDriver) {
       {"offset that wraps", two_objects, {UINT64_MAX - 3}, none},
       {"object over the end", words({1, 2}) + two_objects.substr(0, 20), {8}, none},
       {"misaligned offset", two_objects, {2}, none},
+      {"offsets in descending order", two_objects, {24, 0}, none},
       {"overlapping objects", two_objects, {0, 4}, none},
       {"unknown type", words({1, 2, 3, 4, 5, 6}), {0}, none},
       {"half an offset", two_objects, {0}, [](auto* t) { t->offsets_size = 4; }},

@@ -83,14 +83,11 @@ TEST_F(ServiceDirectoryTest, ForgetsTheDeadButNotTheirSuccessors) {
   const String16 name("sentrova.rescue");
   ASSERT_EQ(android::OK, add(name, first));
   ASSERT_EQ(android::OK, add(String16("other"), first));
-  const auto late = first->recipients;
+  const sp<IBinder::DeathRecipient> late = first->recipients[0].promote();
   ASSERT_EQ(android::OK, add(name, second));
   EXPECT_EQ(1U, first->recipients.size()) << "the replaced entry watches no more";
   first->die();
-  for (const auto& recipient : late) {
-    if (const auto told = recipient.promote(); told != nullptr)
-      told->binderDied(first);
-  }
+  late->binderDied(first);
   EXPECT_EQ(second, directory_->checkService(name));
   EXPECT_EQ(nullptr, directory_->checkService(String16("other")));
   EXPECT_EQ(android::BAD_VALUE, add(name, first)) << "a dead service is not entered";
