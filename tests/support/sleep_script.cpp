@@ -1,7 +1,6 @@
 #include "tests/support/sleep_script.h"
 
 #include <android-base/logging.h>
-#include <errno.h>
 #include <time.h>
 #include <unistd.h>
 
@@ -52,38 +51,21 @@ bool SleepScript::take_sleep(int64_t microseconds) {
 
 }  // namespace sentrova::testing
 
-namespace {
-
-constexpr int64_t kMicrosecondsPerSecond = 1'000'000;
-
-// Returns the microseconds left when a signal ended the sleep, else 0.
-int64_t really_sleep(int64_t microseconds) {
-  timespec request = {.tv_sec = static_cast<time_t>(microseconds / kMicrosecondsPerSecond),
-                      .tv_nsec = static_cast<long>(microseconds % kMicrosecondsPerSecond) * 1000};
-  timespec left = {};
-  return nanosleep(&request, &left) == 0
-             ? 0
-             : left.tv_sec * kMicrosecondsPerSecond + left.tv_nsec / 1000;
-}
-
-}  // namespace
-
 extern "C" SENTROVA_API unsigned int sleep(unsigned int seconds) {
-  const int64_t microseconds = seconds * kMicrosecondsPerSecond;
-  if (sentrova::testing::SleepScript::take_sleep(microseconds)) {
+  if (sentrova::testing::SleepScript::take_sleep(int64_t{seconds} * 1'000'000)) {
     return 0;
   }
-  const int64_t left = really_sleep(microseconds);
-  return static_cast<unsigned int>((left + kMicrosecondsPerSecond - 1) / kMicrosecondsPerSecond);
+  timespec left = {.tv_sec = seconds, .tv_nsec = 0};
+  return nanosleep(&left, &left) == 0
+             ? 0
+             : static_cast<unsigned int>(left.tv_sec) + (left.tv_nsec != 0);
 }
 
 extern "C" SENTROVA_API int usleep(useconds_t microseconds) {
   if (sentrova::testing::SleepScript::take_sleep(microseconds)) {
     return 0;
   }
-  if (really_sleep(microseconds) == 0) {
-    return 0;
-  }
-  errno = EINTR;
-  return -1;
+  const timespec request = {.tv_sec = microseconds / 1'000'000,
+                            .tv_nsec = microseconds % 1'000'000 * 1000L};
+  return nanosleep(&request, nullptr);
 }
