@@ -10,6 +10,7 @@ from pathlib import Path
 
 from scripts import building
 
+PRIVATE_MOUNTS = ["unshare", "--mount"] + ([] if os.geteuid() == 0 else ["--map-root-user"])
 PROGRAM = building.BUILD / "native/cli/sentrova"
 CLI = building.ROOT / "cli"
 MAN_PAGE = CLI / "man/sentrova.8"
@@ -55,19 +56,56 @@ zle -N capture
 bindkey '^I' capture
 """
 
-# The device's volumes, as the program lists them for another.
-VOLUMES = "/data\tf2fs\t/dev/block/sda1\t-\n/cache\text4\t-\t-\n/data2\text4\t-\t-\n"
-MOUNT_POINTS = {"/data", "/data2", "/cache"}
-NO_VOLUMES = 'echo /data; echo "no table" >&2; exit 4'
+# Runs a command in the folder $1/work under a private root, which has the device's files from
+# $1/device and two volumes mounted.
+PRIVATE_ROOT = r"""
+root=$1/root
+mkdir -p "$root"
+mount -t tmpfs tmpfs "$root"
+cp -r "$1/device/." "$root"
+for path in /bin /lib /lib64 /usr /dev /proc "$1" "$2"; do
+  [ -e "$path" ] || continue
+  if [ -L "$path" ]; then cp -P "$path" "$root"; continue; fi
+  mkdir -p "$root$path"
+  mount --rbind "$path" "$root$path"
+done
+mkdir "$root/data" "$root/logs"
+mount -t tmpfs /dev/block/sda1 "$root/data"
+mount -t tmpfs logs "$root/logs"
+folder=$1
+shift 2
+exec chroot "$root" env -C "$folder/work" "$@"
+"""
+
+FSTAB = """# /dev/block/sda9 /comment ext4 ro wait
+/dev/block/sda1\t/data f2fs noatime wait,check
+  /dev/block/sda1 /data ext4 noatime wait
+#/dev/block/sda8 /old ext4 ro wait
+system /system erofs ro logical
+/dev/block/sda2 /data2 ext4 ro wait
+/dev/block/sda3 / ext4 ro wait
+/dev/block/zram0 none swap defaults defaults
+"""
+MOUNTABLE = {"/data", "/data2", "/system", "/cache", "/otg", "/sdcard"}
+
+# What each device has besides its root, and what the verbs' mount points are completed to there.
+PROPERTY = {"etc/properties/ro.hardware": "zuno"}
+GETPROP = {"tools/getprop": '#!/bin/sh\n[ "$*" = ro.hardware ] && echo zuno'}
+DEVICES: list[tuple[dict[str, str], dict[str, set[str]]]] = [
+    ({**PROPERTY, "etc/recovery.fstab": FSTAB, "vendor/etc/fstab.zuno": ""},
+     {"mount ": MOUNTABLE, "mount /da": {"/data", "/data2"}, "mount /data ": set(),
+      "--user 10 --json format /": {"/data", "/data2", "/cache"},
+      "--user=10 format --yes --from one /c": {"/cache"}}),
+    ({**PROPERTY, "vendor/etc/fstab.zuno": FSTAB}, {"mount ": MOUNTABLE}),
+    ({**GETPROP, "vendor/etc/fstab.zuno": FSTAB}, {"mount ": MOUNTABLE}),
+    ({**PROPERTY, "vendor/etc/fstab.other": FSTAB},
+     {"mount ": set(), "format ": set(), "unmount --force /d": {"/data"},
+      "holders /da": {"/data"}, "holders /log": set()}),
+]
 
 # What a line is completed to, in a folder with the directory "one" and the file "other". Options do
 # not count: zsh offers them where an argument is not known.
 LINES: dict[str, set[str]] = {
-    "mount ": MOUNT_POINTS,
-    "unmount --force /d": {"/data", "/data2"},
-    "--user 10 --json holders /c": {"/cache"},
-    "--user=10 format --yes --from one /c": {"/cache"},
-    "mount /data ": set(),
     "verify ": set(),
     "format --from o": {"one"},
     "format --from=o": {"one"},
@@ -120,25 +158,34 @@ def options_in_man_page() -> dict[str, set[str]]:
 
 
 class Shells:
-    """A folder to complete in, with a program that lists the volumes by the given commands."""
+    """A folder to complete in, in a root with the given files if there are any. The program must
+    not be run."""
 
-    def __init__(self, folder: str, volumes: str) -> None:
-        self.folder, self.tools = Path(folder, "work"), Path(folder, "tools")
+    def __init__(self, folder: str, device: dict[str, str]) -> None:
+        self.folder, self.tools = Path(folder, "work"), Path(folder, "device/tools")
         (self.folder / "one").mkdir(parents=True)
         (self.folder / "other").touch()
-        self.tools.mkdir()
-        program = self.tools / "sentrova"
-        program.write_text(f'#!/bin/sh\n[ "$*" = volumes ] || exit 2\n{volumes}\n')
-        program.chmod(0o755)
+        self.tools.mkdir(parents=True)
+        self.ran = self.folder / "ran"
+        self.root: list[object] = []
+        files = {"tools/sentrova": f"#!/bin/sh\n: >'{self.ran}'\n", **device}
+        for name, text in files.items():
+            path = Path(folder, "device", name)
+            path.parent.mkdir(parents=True, exist_ok=True)
+            path.write_text(text)
+            path.chmod(0o755)
+        if device:
+            self.root = [*PRIVATE_MOUNTS, "sh", "-euc", PRIVATE_ROOT, "sh", folder, CLI]
 
     def run(self, *command: object) -> str:
-        path = f"{self.tools}:{os.environ['PATH']}"
+        environment = {"PATH": f"{self.tools}:{os.environ['PATH']}", "TERM": "dumb",
+                       "ANDROID_PROPERTY_DIR": "/etc/properties"}
         result = subprocess.run(
-            [str(part) for part in command], cwd=self.folder, env={"PATH": path, "TERM": "dumb"},
+            [str(part) for part in (*self.root, *command)], cwd=self.folder, env=environment,
             stdin=subprocess.DEVNULL, capture_output=True, text=True, timeout=60, check=True,
         )
-        if result.stderr:
-            raise AssertionError(result.stderr)
+        if result.stderr or self.ran.exists():
+            raise AssertionError(result.stderr or "the program was run")
         return result.stdout
 
     def bash(self, lines: list[str]) -> list[set[str]]:
@@ -164,10 +211,10 @@ class CommandLine(unittest.TestCase):
     def setUpClass(cls) -> None:
         building.build_preset("native", "sentrova")
 
-    def check_completions(self, expected: dict[str, set[str]], volumes: str) -> None:
+    def check_completions(self, expected: dict[str, set[str]], device: dict[str, str]) -> None:
         for shell in (Shells.bash, Shells.zsh):
             with tempfile.TemporaryDirectory() as folder:
-                found = dict(zip(expected, shell(Shells(folder, volumes), list(expected))))
+                found = dict(zip(expected, shell(Shells(folder, device), list(expected))))
             for line, matches in found.items():
                 if not line.endswith("-"):
                     found[line] = {match for match in matches if not match.startswith("-")}
@@ -179,11 +226,16 @@ class CommandLine(unittest.TestCase):
         expected |= {f"{verb} ".lstrip(): names for verb in options
                      if (names := names_in("Subcommands", verb))}
         self.assertGreater(len(expected), 20)
-        self.check_completions(expected, "exit 2")
+        self.check_completions(expected, {})
 
     def test_completions_of_arguments(self) -> None:
-        self.check_completions(LINES, f"printf %s '{VOLUMES}'")
-        self.check_completions({"mount /": set(), "format ": set()}, NO_VOLUMES)
+        self.check_completions(LINES, {})
+
+    def test_completions_of_mount_points(self) -> None:
+        if subprocess.run([*PRIVATE_MOUNTS, "true"], capture_output=True, check=False).returncode:
+            self.skipTest("no private mounts here")
+        for device, expected in DEVICES:
+            self.check_completions(expected, device)
 
     def test_man_page(self) -> None:
         groups = {verb for verb in options_by_verb() if verb and names_in("Subcommands", verb)}
