@@ -126,7 +126,7 @@ ExitStatus check_map(const Arguments& arguments, const Output& output) {
   MemMapping mapping;
   std::string problem;
   if (!map_file(arguments.file, mapping, problem)) {
-    output.error(problem);
+    output.error("no usable map: " + arguments.file + ": " + problem);
     return kExitUsage;
   }
   fail_on_unreadable_data();
@@ -144,8 +144,8 @@ ExitStatus check_map(const Arguments& arguments, const Output& output) {
 }  // namespace
 
 void add_blockmap_command(CLI::App& app, const Output& output, int& status) {
-  CLI::App* const command = app.add_subcommand(
-      "blockmap", "Write the map of the blocks that hold a file, or read a file through one");
+  CLI::App* const command =
+      app.add_subcommand("blockmap", "Write the block map of a file, or read a file through one");
   // Shared with the callback, which outlives this function.
   const auto arguments = std::make_shared<Arguments>();
   command->add_option("file", arguments->file, "The file, or with --check a map")->required();

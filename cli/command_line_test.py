@@ -1,5 +1,6 @@
 """The man page and the completions of sentrova, held against what the program itself says."""
 
+import json
 import os
 import re
 import subprocess
@@ -120,6 +121,20 @@ LINES: dict[str, set[str]] = {
     "reboot ": {"recovery", "bootloader"},
 }
 
+# Command lines that cannot be used, with what the message says and the verb whose help it names.
+WRONG_LINES = [
+    ("", "a verb is missing or unknown", ""),
+    ("nosuch --help", "a verb is missing or unknown", ""),
+    ("datadump nosuch --help", "a verb is missing or unknown", "datadump"),
+    ("--user", "--user", ""),
+    ("--user -1 status", "a user id is a number", "status"),
+    ("find --user 1x", "a user id is a number", "find"),
+    ("find name", "directory is required", "find"),
+    ("mount --secret /data", "not expected", "mount"),
+    ("verify secret", "never taken from the command line", "verify"),
+    ("datadump status secret --help", "not expected", "datadump status"),
+]
+
 
 @cache
 def help_of(verb: str) -> str:
@@ -140,7 +155,7 @@ def options_by_verb() -> dict[str, set[str]]:
     options = {"": names_in("Options", "")}
     waiting = [""]
     for verb in waiting:  # which grows
-        for name in names_in("Subcommands", verb):
+        for name in names_in("Verbs", verb):
             nested = f"{verb} {name}".strip()
             options[nested] = names_in("Options", nested) - options[""]
             waiting.append(nested)
@@ -224,7 +239,7 @@ class CommandLine(unittest.TestCase):
         options = options_by_verb()
         expected = {f"{verb} -".lstrip(): own | options[""] for verb, own in options.items()}
         expected |= {f"{verb} ".lstrip(): names for verb in options
-                     if (names := names_in("Subcommands", verb))}
+                     if (names := names_in("Verbs", verb))}
         self.assertGreater(len(expected), 20)
         self.check_completions(expected, {})
 
@@ -237,8 +252,19 @@ class CommandLine(unittest.TestCase):
         for device, expected in DEVICES:
             self.check_completions(expected, device)
 
+    def test_wrong_command_lines(self) -> None:
+        for line, message, verb in WRONG_LINES:
+            with self.subTest(line=line):
+                result = subprocess.run([str(PROGRAM), "--json", *line.split()], check=False,
+                                        capture_output=True, text=True, timeout=60)
+                error = json.loads(result.stdout)["error"]
+                self.assertEqual((result.returncode, result.stderr), (2, f"sentrova: {error}\n"))
+                self.assertIn(message, error)
+                self.assertIn(f"`{f'sentrova {verb}'.strip()} --help`", error)
+                self.assertNotIn("secret", error)
+
     def test_man_page(self) -> None:
-        groups = {verb for verb in options_by_verb() if verb and names_in("Subcommands", verb)}
+        groups = {verb for verb in options_by_verb() if verb and names_in("Verbs", verb)}
         verbs = {verb: own for verb, own in options_by_verb().items() if verb not in groups}
         self.assertEqual(options_in_man_page(), verbs)
         statuses = re.findall(r"^\.It (\d)\n([^.]*)\.$", MAN_PAGE.read_text(), re.MULTILINE)

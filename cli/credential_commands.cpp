@@ -34,17 +34,17 @@ ExitStatus show_password_type(int user_id, const Output& output) {
 }
 
 ExitStatus verify_password(int user_id, const Output& output) {
+  const ServiceConnection connection = connect_to_service();
+  if (connection.service == nullptr) {
+    output.error(connection.error);
+    return kExitServiceUnavailable;
+  }
   PasswordInput input = read_password("Password: ");
   if (!input.error.empty()) {
     output.error(input.error);
     return kExitUsage;
   }
   const WipeOnExit wipe_password(input.password);
-  const ServiceConnection connection = connect_to_service();
-  if (connection.service == nullptr) {
-    output.error(connection.error);
-    return kExitServiceUnavailable;
-  }
   const int32_t answer = connection.service->verifyUserPassWord(user_id, input.password);
   if (is_transport_status(answer)) {
     output.error(describe_transport_status(answer));

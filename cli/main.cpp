@@ -7,6 +7,7 @@
 #include <nlohmann/json.hpp>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "cli/blockmap_command.h"
 #include "cli/exit_status.h"
@@ -30,8 +31,8 @@ std::string footer() {
   }
   return text +
          "A password is asked for without echo on a terminal; otherwise it is the first line of\n"
-         "standard input. Every command takes --json. What the library logs goes to standard\n"
-         "error.";
+         "standard input. --json and --user may also stand behind the verb. What the library logs\n"
+         "goes to standard error.";
 }
 
 // As the parser will find, but also where it fails before it comes to the option.
@@ -40,22 +41,53 @@ bool asks_for_json(int argc, char** argv) {
                      [](const char* word) { return std::string_view(word) == "--json"; });
 }
 
+// Where the parser came to: the program itself or a verb.
+const CLI::App& innermost(const CLI::App& app) {
+  const std::vector<const CLI::App*> verbs =
+      app.get_subcommands([](const CLI::App* verb) { return verb->parsed(); });
+  return verbs.empty() ? app : innermost(*verbs.front());
+}
+
+std::string name_with_program(const CLI::App& app) {
+  return (app.get_parent() == nullptr ? "" : name_with_program(*app.get_parent()) + " ") +
+         app.get_name();
+}
+
+// What was given too much is not repeated: it may be a password.
+std::string describe_unexpected(const CLI::App& verb) {
+  const bool takes_password = verb.get_name() == "verify" || verb.get_name() == "unlock";
+  return takes_password
+             ? "an argument was not expected; passwords are never taken from the command line"
+             : "an argument was not expected";
+}
+
+bool is_a(const CLI::ParseError& error, CLI::ExitCodes kind) {
+  return error.get_exit_code() == static_cast<int>(kind);
+}
+
+// What is wrong with the command line: `error` alone does not know the verb.
+std::string describe(const CLI::ParseError& error, const CLI::App& app) {
+  const CLI::App& verb = innermost(app);
+  const std::string help = "; `" + name_with_program(verb) + " --help` ";
+  const bool is_extra = is_a(error, CLI::ExitCodes::Success) ||  // help, with more
+                        is_a(error, CLI::ExitCodes::ExtrasError);
+  const bool is_missing = is_a(error, CLI::ExitCodes::RequiredError);
+  if (verb.get_require_subcommand_min() > 0 && (is_extra || is_missing)) {
+    return "a verb is missing or unknown" + help + "lists them";
+  }
+  return (is_extra ? describe_unexpected(verb) : error.what()) + help + "tells what it takes";
+}
+
 int parse(CLI::App& app, int argc, char** argv, const sentrova::Output& output) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::CallForVersion&) {
     output.result(kVersion, {{"version", SENTROVA_VERSION}});
-  } catch (const CLI::ExtrasError&) {
-    // What was given is not repeated: it may be a password.
-    output.error("an argument was not expected; passwords are never taken from the command line");
-    return sentrova::kExitUsage;
   } catch (const CLI::ParseError& error) {
-    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::Success)) {
-      return app.exit(error);  // help
+    if (is_a(error, CLI::ExitCodes::Success) && app.remaining_size(true) == 0) {
+      return app.exit(error);
     }
-    output.error(app.get_subcommands().empty()
-                     ? "a command is missing or unknown; `sentrova --help` lists them"
-                     : error.what());
+    output.error(describe(error, app));
     return sentrova::kExitUsage;
   }
   return sentrova::kExitSuccess;
@@ -64,6 +96,9 @@ int parse(CLI::App& app, int argc, char** argv, const sentrova::Output& output) 
 int run(int argc, char** argv) {
   CLI::App app(kDescription, "sentrova");
   app.footer(footer());
+  app.group("Verbs");  // of the verbs, which take this over
+  app.get_formatter()->label("SUBCOMMAND", "VERB");
+  app.set_help_flag("-h,--help", "Show this help, or that of the verb, and exit");
   app.require_subcommand(1);
   app.fallthrough();
   bool json = asks_for_json(argc, argv);

@@ -47,7 +47,7 @@ int mount_row(const FstabEntry& row, const std::string& path) {
 
 std::string describe_holders(const std::string& mount_point) {
   const size_t count = find_holders(mount_point).holders.size();
-  return count == 0 ? ""
+  return count == 0 ? "; the messages tell why"
                     : "; processes that hold it: " + std::to_string(count) +
                           " (`sentrova holders " + mount_point + "` lists them)";
 }

@@ -47,10 +47,11 @@ CLI::App* add_command(CLI::App& app, const char* name, const char* description,
 void add_power_commands(CLI::App& app, const Output& output, int& status) {
   // Shared with the callbacks, which outlive this function.
   const auto reason = std::make_shared<std::string>();
-  add_command(app, "reboot", "Reboot the device", reason,
+  add_command(app, "reboot", "Reboot the device at once, without asking", reason,
               "Where to, as recovery or bootloader; the system if left out")
       ->callback([reason, &output] { reboot(*reason, output); });
-  add_command(app, "shutdown", "Power the device off", reason, "Why, for the device's records")
+  add_command(app, "shutdown", "Power the device off at once, without asking", reason,
+              "Why, for the device's records")
       ->callback([reason, &output, &status] { status = shut_down(*reason, output); });
 }
 

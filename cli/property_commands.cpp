@@ -48,7 +48,7 @@ bool with_volumes(const Output& output, Call call) {
       return true;
     }
   }
-  output.error("the device's volume table cannot be read");
+  output.error("the device's volume table cannot be read; the messages tell why");
   return false;
 }
 
@@ -113,7 +113,7 @@ constexpr PropertyVerb kPropertyVerbs[] = {
 
 void add_property_commands(CLI::App& app, const Output& output, int& status) {
   CLI::App* const properties =
-      app.add_subcommand("properties", "Load the vendor's properties, in this process");
+      app.add_subcommand("properties", "Load or back up the vendor's properties");
   properties->require_subcommand(1);
   for (const PropertyVerb& verb : kPropertyVerbs) {
     properties->add_subcommand(verb.name, verb.help)->callback([&verb, &output, &status] {

@@ -45,7 +45,7 @@ constexpr Help kFormatHelp = {
     "there, and goes on only after \"yes\" on a terminal or with --yes. The volume is unmounted\n"
     "first, by force if need be (see unmount)."};
 constexpr Help kFindHelp = {"Find a file by its name in a directory and all below it",
-                            "Shows the first one."};
+                            "Shows the path of the first. Exit status 1 when there is none."};
 constexpr Help kOtgHelp = {"Switch the USB port to host mode and wait for a disk",
                            "Waits for a minute at most. Exit status 1 when none came."};
 constexpr Help kSdcardHelp = {"Show the block device of the SD card",

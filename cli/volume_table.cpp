@@ -35,7 +35,7 @@ bool load_volumes(const Output& output) {
     }
   }
   if (!is_loaded) {
-    output.error("the device's volume table cannot be read");
+    output.error("the device's volume table cannot be read; the messages tell why");
   }
   return is_loaded;
 }
