@@ -52,18 +52,22 @@ PasswordInput checked(std::string& password) {
   return {.password = std::move(password), .error = ""};
 }
 
+// Told to read standard input, readpassphrase would neither show the prompt nor switch the echo
+// off; so would it without a controlling terminal, if it need not have one.
 PasswordInput ask_on_terminal(const char* prompt) {
   std::array<char, 4096> line;
-  if (readpassphrase(prompt, line.data(), line.size(), RPP_ECHO_OFF | RPP_STDIN) == nullptr) {
+  if (readpassphrase(prompt, line.data(), line.size(), RPP_ECHO_OFF | RPP_REQUIRE_TTY) == nullptr) {
     const int error = errno;
     explicit_bzero(line.data(), line.size());
-    return failure(std::string("cannot read the password: ") + strerror(error));
+    return failure(error == ENOTTY
+                       ? "no controlling terminal to ask on; give the password through a pipe"
+                       : std::string("cannot read the password: ") + strerror(error));
   }
   std::string password(line.data());
   const WipeOnExit wipe_password(password);
   explicit_bzero(line.data(), line.size());
   if (password.size() + 1 == line.size()) {
-    return failure("the password is too long to be typed; give it on standard input");
+    return failure("the password is too long to be typed; give it through a pipe");
   }
   return checked(password);
 }
