@@ -1,4 +1,6 @@
 #include <android-base/logging.h>
+#include <fcntl.h>
+#include <unistd.h>
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
@@ -93,6 +95,19 @@ int parse(CLI::App& app, int argc, char** argv, const sentrova::Output& output) 
   return sentrova::kExitSuccess;
 }
 
+// Where standard input, output or error is closed, the next file to be opened would stand in for
+// it: a message of this program, of the library or of a formatting tool could be written to a
+// volume. What takes the place here is inherited and can be neither read nor written.
+void occupy_closed_standard_streams() {
+  int fd = -1;
+  do {
+    fd = open("/", O_PATH);
+  } while (fd >= STDIN_FILENO && fd <= STDERR_FILENO);
+  if (fd > STDERR_FILENO) {
+    close(fd);
+  }
+}
+
 int run(int argc, char** argv) {
   CLI::App app(kDescription, "sentrova");
   app.footer(footer());
@@ -119,6 +134,7 @@ int run(int argc, char** argv) {
 }  // namespace
 
 int main(int argc, char** argv) {
+  occupy_closed_standard_streams();
   setvbuf(stdout, nullptr, _IOLBF, 0);  // what the library says meanwhile is seen as it comes
   android::base::InitLogging(argv, android::base::StderrLogger);
   try {
