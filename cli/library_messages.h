@@ -5,7 +5,8 @@
 namespace sentrova {
 
 // While one is alive, what the library writes to standard output goes to standard error, so that
-// standard output holds the answer alone. One at a time, while no other thread writes there.
+// standard output holds the answer alone. Where nobody reads them any more they are lost, and the
+// work goes on. One at a time, while no other thread writes there.
 class LibraryMessagesToStderr {
  public:
   LibraryMessagesToStderr();
@@ -15,6 +16,7 @@ class LibraryMessagesToStderr {
 
  private:
   android::base::unique_fd original_;
+  void (*pipe_signal_action_)(int);
 };
 
 }  // namespace sentrova
