@@ -67,11 +67,22 @@ ExitStatus run_format(const FstabEntry& row, const std::string& directory, const
   return kExitSuccess;
 }
 
-ExitStatus format_row(const FstabEntry& row, const std::string& directory, bool is_confirmed,
-                      const Output& output) {
-  const std::string obstacle = find_format_obstacle(row, directory);
+// Whether nothing keeps the row's volume from being formatted on that device; tells what does.
+bool can_format(const FstabEntry& row, const std::string& directory, dev_t device,
+                const Output& output) {
+  const std::string obstacle = block_device(row.blk_device) == device
+                                   ? find_format_obstacle(row, directory)
+                                   : row.blk_device + " is another device by now";
   if (!obstacle.empty()) {
     output.error(obstacle);
+  }
+  return obstacle.empty();
+}
+
+ExitStatus format_row(const FstabEntry& row, const std::string& directory, bool is_confirmed,
+                      const Output& output) {
+  const dev_t device = block_device(row.blk_device);
+  if (!can_format(row, directory, device, output)) {
     return kExitUsage;
   }
   show_lines(describe_format(row, directory));
@@ -83,7 +94,9 @@ ExitStatus format_row(const FstabEntry& row, const std::string& directory, bool 
     output.error("not confirmed, nothing was changed");
     return kExitAnswerIsNo;
   }
-  return run_format(row, directory, output);
+  // Nobody knows how long the question stood there.
+  return can_format(row, directory, device, output) ? run_format(row, directory, output)
+                                                    : kExitUsage;
 }
 
 }  // namespace

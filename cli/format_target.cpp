@@ -5,6 +5,7 @@
 #include "cli/device_state.h"
 #include "cli/holders.h"
 #include "cli/mounts.h"
+#include "cli/printable.h"
 #include "datadump/datadump.h"
 
 namespace sentrova {
@@ -14,10 +15,11 @@ using android::fs_mgr::FstabEntry;
 
 constexpr char kData[] = "/data";
 
-// The device behind a path to one: 0 where there is none.
-dev_t block_device(const std::string& path) {
-  struct stat status = {};
-  return stat(path.c_str(), &status) == 0 && S_ISBLK(status.st_mode) ? status.st_rdev : 0;
+// By the device's name, or where that leads nowhere (/dev/root), by what the files there tell.
+bool is_mount_of(const Mount& mount, dev_t device) {
+  struct stat root = {};
+  return block_device(mount.device) == device ||
+         (stat(mount.mount_point.c_str(), &root) == 0 && root.st_dev == device);
 }
 
 // The mount point, other than the row's own, at which its device is mounted; empty if there is
@@ -25,8 +27,7 @@ dev_t block_device(const std::string& path) {
 std::string find_other_mount(const FstabEntry& row) {
   const dev_t device = block_device(row.blk_device);
   for (const Mount& mount : read_mounts()) {
-    if (device != 0 && mount.mount_point != row.mount_point &&
-        block_device(mount.device) == device) {
+    if (mount.mount_point != row.mount_point && is_mount_of(mount, device)) {
       return mount.mount_point;
     }
   }
@@ -61,20 +62,34 @@ std::string describe_mounted(const FstabEntry& row) {
 }
 
 // The library decides by these which device it takes.
-std::string describe_mapping() {
+std::string describe_mapping(bool is_dump_armed) {
   const DeviceState state = read_device_state();
   const bool metadata = state.metadata_encryption.value_or(false);
   if (!state.encrypted() || (!metadata && state.crypto_type != "block")) {
     return "";
   }
-  const int dump = datadump_get_status();
-  return metadata || dump == 1 || dump == 2
+  return metadata || is_dump_armed
              ? "\n  encryption   its device-mapper device is removed, the partition itself "
                "formatted"
              : "\n  encryption   kept: its device-mapper device is formatted, if there is one";
 }
 
+std::string describe_data_format() {
+  const int dump = datadump_get_status();
+  const bool is_dump_armed = dump == 1 || dump == 2;
+  return describe_mapping(is_dump_armed) +
+         (is_dump_armed
+              ? "\n  data dump    armed: only the first 8 GiB are used, and its offset is "
+                "cleared"
+              : "");
+}
+
 }  // namespace
+
+dev_t block_device(const std::string& path) {
+  struct stat status = {};
+  return stat(path.c_str(), &status) == 0 && S_ISBLK(status.st_mode) ? status.st_rdev : 0;
+}
 
 std::string find_format_obstacle(const FstabEntry& row, const std::string& directory) {
   if (row.mount_point == "/") {
@@ -89,6 +104,10 @@ std::string find_format_obstacle(const FstabEntry& row, const std::string& direc
   if (const std::string other = find_other_mount(row); !other.empty()) {
     return row.blk_device + " is mounted at " + other + " too; unmount that first";
   }
+  if (const std::string hold = find_own_hold(row.mount_point);
+      !hold.empty() && find_mount(row.mount_point)) {
+    return hold;
+  }
   return directory.empty() ? "" : find_directory_obstacle(directory, row);
 }
 
@@ -97,7 +116,7 @@ std::string describe_format(const FstabEntry& row, const std::string& directory)
                      row.blk_device + "\n  file system  " + row.fs_type +
                      ", made anew\n  mounted      " + describe_mounted(row);
   if (row.mount_point == kData) {
-    text += describe_mapping();
+    text += describe_data_format();
   }
   if (row.key_loc.starts_with('/')) {
     text += "\n  key device   " + row.key_loc + " may be wiped";
@@ -107,7 +126,7 @@ std::string describe_format(const FstabEntry& row, const std::string& directory)
             " processes, which will be ended where they stay";
   }
   if (!directory.empty()) {
-    text += "\n  filled from  " + directory;
+    text += "\n  filled from  " + printable(directory);
   }
   return text;
 }

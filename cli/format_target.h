@@ -1,14 +1,18 @@
 #pragma once
 
 #include <fstab/fstab.h>
+#include <sys/types.h>
 
 #include <string>
 
 namespace sentrova {
 
+// The block device behind a path to one; 0 where there is none.
+dev_t block_device(const std::string& path);
+
 // Returns, in words, why the row's volume cannot be formatted, or an empty text: its file system is
 // one that is not made, the device runs from it, its device is not there or is mounted elsewhere
-// too, or `directory` (if not empty) is none or lies on the volume itself.
+// too, this process holds it, or `directory` (if not empty) is none or lies on the volume itself.
 std::string find_format_obstacle(const android::fs_mgr::FstabEntry& row,
                                  const std::string& directory);
 

@@ -105,6 +105,15 @@ HolderSearch find_holders(const std::string& path) {
   return search;
 }
 
+std::string find_own_hold(const std::string& path) {
+  Holder self;
+  self.pid = getpid();
+  read_holder(path, self);
+  return self.held.empty()
+             ? ""
+             : path + " is held by this command, which was started there or is redirected there";
+}
+
 std::string mapped_path(const std::string& line) {
   // Addresses, rights, offset, device and inode stand before it; proc(5).
   int start = 0;

@@ -29,6 +29,9 @@ struct HolderSearch {
 // or something below it. Nothing is signalled. What ends meanwhile is passed over.
 HolderSearch find_holders(const std::string& path);
 
+// Why the path stays busy as long as the calling process runs, in words; empty where it does not.
+std::string find_own_hold(const std::string& path);
+
 // The path of a line of /proc/PID/maps; empty where the mapping has no file.
 std::string mapped_path(const std::string& line);
 

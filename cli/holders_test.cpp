@@ -1,6 +1,7 @@
 #include "cli/holders.h"
 
 #include <android-base/file.h>
+#include <android-base/unique_fd.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <sys/mman.h>
@@ -66,6 +67,10 @@ TEST(Holders, AreFoundByAllTheyHoldAndLive) {
   EXPECT_EQ(held, "cwd ;descriptor n /a\nb;mapping /a\\012b;");
   EXPECT_EQ(process.ended_by(), 0);
   EXPECT_TRUE(sentrova::find_holders(path + "2").holders.empty());
+  EXPECT_EQ(sentrova::find_own_hold(path), "");
+  const android::base::unique_fd own(open(file.c_str(), O_RDONLY | O_CLOEXEC));
+  EXPECT_NE(sentrova::find_own_hold(path), "");
+  EXPECT_EQ(sentrova::find_holders(path).holders.size(), 1u) << "the caller is left out";
   unlink(file.c_str());
 }
 

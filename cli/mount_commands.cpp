@@ -111,6 +111,11 @@ ExitStatus unmount_volume(const std::string& path, bool force, const Output& out
                   {{"mount_point", mount_point}, {"mounted", nullptr}});
     return kExitSuccess;
   }
+  // By force all others would be ended first, the caller's shell too, and in vain.
+  if (const std::string hold = find_own_hold(mount_point); !hold.empty()) {
+    output.error(hold);
+    return kExitUsage;
+  }
   int result = 0;
   {
     const LibraryMessagesToStderr messages;

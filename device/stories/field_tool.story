@@ -13,6 +13,8 @@ red=$(printf '\033[31mred')
 
 # Only the answer; what else is said goes to the log.
 tool() { sentrova "$@" 2>"$messages"; }
+tool_in() { (cd "$1" && shift && tool "$@"); }
+tool_unheard() { tool "$@" >&-; }
 
 # expect_json POINTER VALUE: of the last step's answer, which is one JSON object.
 expect_json() { expect_equal "$1" "$2" "$(echo "$output" | json_value "$1")"; }
@@ -38,6 +40,9 @@ expect_status 0
 expect_output_contains "/cache${tab}ext4${tab}$logdata${tab}-${tab}-${tab}-${tab}-"
 expect_message "recovery filesystem table"
 check "looking leaves /data as it was" not_mounted /data
+step "And with standard output closed" tool_unheard volumes
+expect_status 4
+expect_message "the answer could not be written"
 
 before=$(digest "$logdata")
 step "A format that nobody can confirm" tool --json format /cache </dev/null
@@ -103,6 +108,11 @@ step "It is unmounted" tool --json unmount /cache
 expect_status 4
 expect_json /error "cannot unmount /cache; processes that hold it: 2 (\`sentrova holders /cache\` lists them)"
 expect_json /mounted/device "$logdata"
+for verb in "unmount --force" "format --yes"; do
+  step "By force, from a folder of its own: $verb" tool_in /cache $verb /cache
+  expect_status 2
+  expect_message "/cache is held by this command"
+done
 check "its holders were let be" runs "$holder"
 step "By force" tool --json unmount --force /cache
 expect_status 0
