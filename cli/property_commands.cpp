@@ -10,6 +10,7 @@
 #include "cli/exit_status.h"
 #include "cli/library_messages.h"
 #include "cli/progress.h"
+#include "cli/volume_table.h"
 #include "recovery_utils/roots.h"
 #include "recovery_utils/roots_ex.h"
 
@@ -36,6 +37,7 @@ void forget_answers() {
 // Returns false, after saying so, where there is no table.
 template <typename Call>
 bool with_volumes(const Output& output, Call call) {
+  note_unless_root(output);
   {
     const LibraryMessagesToStderr messages;
     const Progress progress("waiting for the property loader");

@@ -1,5 +1,7 @@
 #include "cli/volume_table.h"
 
+#include <unistd.h>
+
 #include <filesystem>
 
 #include "cli/library_messages.h"
@@ -24,6 +26,7 @@ void unmount_loaded_data() {
 }  // namespace
 
 bool load_volumes(const Output& output) {
+  note_unless_root(output);
   const bool data_was_mounted = find_mount(kData).has_value();
   bool is_loaded = false;
   {
@@ -38,6 +41,12 @@ bool load_volumes(const Output& output) {
     output.error("the device's volume table cannot be read; the messages tell why");
   }
   return is_loaded;
+}
+
+void note_unless_root(const Output& output) {
+  if (geteuid() != 0) {
+    output.note("not run as root: volumes can be looked at, hardly more");
+  }
 }
 
 std::string table_path(const std::string& path) {

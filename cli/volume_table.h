@@ -10,6 +10,9 @@ namespace sentrova {
 // has no table.
 bool load_volumes(const Output& output);
 
+// Says so where this process is not root's, which all but looking takes.
+void note_unless_root(const Output& output);
+
 // The absolute path without "." and "..", doubled slashes or one at its end, as the table takes it;
 // empty if `path` is not absolute.
 std::string table_path(const std::string& path);
