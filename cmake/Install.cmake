@@ -52,10 +52,8 @@ foreach(file
     completions/bash/sentrova:${CMAKE_INSTALL_DATADIR}/bash-completion/completions
     completions/zsh/_sentrova:${CMAKE_INSTALL_DATADIR}/zsh/site-functions)
   string(REGEX MATCH "^(.*):(.*)$" _ ${file})
-  if(EXISTS ${PROJECT_SOURCE_DIR}/cli/${CMAKE_MATCH_1})
-    install(FILES ${PROJECT_SOURCE_DIR}/cli/${CMAKE_MATCH_1} DESTINATION ${CMAKE_MATCH_2}
-      COMPONENT runtime)
-  endif()
+  install(FILES ${PROJECT_SOURCE_DIR}/cli/${CMAKE_MATCH_1} DESTINATION ${CMAKE_MATCH_2}
+    COMPONENT runtime)
 endforeach()
 
 # The public headers under their folders' names, and of the platform's what these include and what a
