@@ -18,6 +18,8 @@
 #include <cstdint>
 #include <vector>
 
+#include "cli/mounts.h"
+
 namespace sentrova {
 namespace {
 
@@ -45,11 +47,6 @@ std::string system_error(const std::string& what) {
   return what + ": " + strerror(errno);
 }
 
-bool is_device(const std::string& path, dev_t device) {
-  struct stat status = {};
-  return stat(path.c_str(), &status) == 0 && S_ISBLK(status.st_mode) && status.st_rdev == device;
-}
-
 // The node of a block device by what sysfs calls it; empty if there is none.
 std::string find_device_node(dev_t device) {
   std::string uevent;
@@ -61,7 +58,7 @@ std::string find_device_node(dev_t device) {
     }
     const std::string name = line.substr(strlen("DEVNAME="));
     for (const char* const folder : {"/dev/block/", "/dev/"}) {
-      if (is_device(folder + name, device)) {
+      if (block_device(folder + name) == device) {
         return folder + name;
       }
     }

@@ -9,6 +9,7 @@
 
 #include "cli/format_target.h"
 #include "cli/library_messages.h"
+#include "cli/mounts.h"
 #include "cli/progress.h"
 #include "cli/volume_table.h"
 #include "recovery_utils/roots.h"

@@ -86,11 +86,6 @@ std::string describe_data_format() {
 
 }  // namespace
 
-dev_t block_device(const std::string& path) {
-  struct stat status = {};
-  return stat(path.c_str(), &status) == 0 && S_ISBLK(status.st_mode) ? status.st_rdev : 0;
-}
-
 std::string find_format_obstacle(const FstabEntry& row, const std::string& directory) {
   if (row.mount_point == "/") {
     return "/ is what this device runs from";

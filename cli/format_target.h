@@ -1,14 +1,10 @@
 #pragma once
 
 #include <fstab/fstab.h>
-#include <sys/types.h>
 
 #include <string>
 
 namespace sentrova {
-
-// The block device behind a path to one; 0 where there is none.
-dev_t block_device(const std::string& path);
 
 // Returns, in words, why the row's volume cannot be formatted, or an empty text: its file system is
 // one that is not made, the device runs from it, its device is not there or is mounted elsewhere

@@ -3,6 +3,7 @@
 #include <android-base/stringprintf.h>
 #include <mntent.h>
 #include <stdio.h>
+#include <sys/stat.h>
 #include <sys/statvfs.h>
 
 #include <algorithm>
@@ -37,6 +38,11 @@ std::optional<Mount> find_mount(const std::vector<Mount>& mounts, const std::str
 
 std::optional<Mount> find_mount(const std::string& mount_point) {
   return find_mount(read_mounts(), mount_point);
+}
+
+dev_t block_device(const std::string& path) {
+  struct stat status = {};
+  return stat(path.c_str(), &status) == 0 && S_ISBLK(status.st_mode) ? status.st_rdev : 0;
 }
 
 FileSystemUse read_use(const std::string& mount_point) {

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <sys/types.h>
+
 #include <cstdint>
 #include <nlohmann/json_fwd.hpp>
 #include <optional>
@@ -24,6 +26,9 @@ std::optional<Mount> find_mount(const std::vector<Mount>& mounts, const std::str
 
 // The same, of this moment's table.
 std::optional<Mount> find_mount(const std::string& mount_point);
+
+// The block device behind a path to one; 0 where there is none.
+dev_t block_device(const std::string& path);
 
 // How full a mounted file system is, in bytes; all 0 where it does not tell.
 struct FileSystemUse {
