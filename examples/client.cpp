@@ -12,8 +12,6 @@
 
 #include <cstdint>
 #include <cstdio>
-#include <iostream>
-#include <string>
 
 #include "interface/isentrova_service.h"
 
@@ -53,11 +51,17 @@ bool call_failed(int32_t answer) {
 }
 
 ExitStatus check_password(android::ISentrovaService& service) {
-  std::string password;
-  std::getline(std::cin, password);
+  // Without a buffer no copy stays behind in the stream.
+  setvbuf(stdin, nullptr, _IONBF, 0);
+  char password[1024] = "";
+  if (fgets(password, sizeof(password), stdin) == nullptr) {
+    fprintf(stderr, "client: no password was given\n");
+    return kCannotTell;
+  }
+  password[strcspn(password, "\n")] = '\0';
   // The copy that the proxy gets is wiped by it; this one is ours to wipe.
   const int32_t answer = service.verifyUserPassWord(kOwner, password);
-  explicit_bzero(password.data(), password.size());
+  explicit_bzero(password, sizeof(password));
   if (call_failed(answer)) {
     return kCannotTell;
   }
