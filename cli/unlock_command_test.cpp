@@ -1,5 +1,6 @@
 #include "cli/unlock_command.h"
 
+#include <android-base/file.h>
 #include <android-base/unique_fd.h>
 #include <binder/IServiceManager.h>
 #include <gtest/gtest.h>
@@ -92,10 +93,14 @@ class Person {
     terminal_.reset(terminal);
   }
 
-  // Typed before the prompt is there, a password would be dropped.
+  // Typed before the prompt is there, a password would be dropped; an interrupt between the prompt
+  // and the wait for keys would not end that wait.
   void answer(const std::string& keys) {
     const size_t before = screen_.size();
     while (screen_.find(kPrompt, before) == std::string::npos && look()) {
+    }
+    for (int time = 0; !waits() && time < 5000; ++time) {
+      usleep(1000);
     }
     EXPECT_EQ(write(terminal_.get(), keys.data(), keys.size()), static_cast<ssize_t>(keys.size()));
   }
@@ -126,6 +131,12 @@ class Person {
   }
 
  private:
+  bool waits() const {
+    std::string stat;
+    android::base::ReadFileToString("/proc/" + std::to_string(child_) + "/stat", &stat);
+    return stat.find(") S ") != std::string::npos;
+  }
+
   // False at the end, and when nothing more comes.
   bool look() {
     constexpr int kPatienceMs = 5000;
