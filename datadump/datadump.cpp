@@ -7,7 +7,10 @@
 #include <string.h>
 
 #include <array>
-#include <memory>
+
+#include "common/streams.h"
+
+using sentrova::File;
 
 namespace {
 
@@ -26,15 +29,10 @@ struct Record {
   bool is_armed() const { return first_magic == kFirstMagic && second_magic == kSecondMagic; }
 };
 
-struct CloseStream {
-  void operator()(FILE* stream) const { fclose(stream); }
-};
-using Stream = std::unique_ptr<FILE, CloseStream>;
-
 // Returns the partition at the record, or null after a message. The stream has no buffer: a
 // transfer counts what reached the partition, of which nothing but the record is touched.
-Stream open_at_record(const char* mode) {
-  Stream stream(fopen(kPartition, mode));
+File open_at_record(const char* mode) {
+  File stream(fopen(kPartition, mode));
   if (stream == nullptr) {
     __android_log_print(ANDROID_LOG_ERROR, nullptr, "Open %s fail:%s.\n", kPartition,
                         strerror(errno));
@@ -46,7 +44,7 @@ Stream open_at_record(const char* mode) {
 }
 
 int read_flag_from_part(RecordBytes& buffer) {
-  const Stream stream = open_at_record("rbe");
+  const File stream = open_at_record("rbe");
   if (stream == nullptr) {
     return -1;
   }
@@ -59,7 +57,7 @@ int read_flag_from_part(RecordBytes& buffer) {
 }
 
 int write_flag_to_part(const RecordBytes& buffer) {
-  const Stream stream = open_at_record("wbe");
+  const File stream = open_at_record("wbe");
   if (stream == nullptr) {
     return -1;
   }

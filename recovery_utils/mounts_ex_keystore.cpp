@@ -6,9 +6,9 @@
 
 #include <array>
 
+#include "common/streams.h"
 #include "recovery_utils/mounts_ex.h"
 #include "recovery_utils/mounts_ex_log.h"
-#include "recovery_utils/streams.h"
 
 using android::base::StringPrintf;
 using sentrova::Directory;

@@ -3,16 +3,18 @@
 #include <android-base/stringprintf.h>
 #include <android-base/strings.h>
 #include <signal.h>
+#include <stdlib.h>
 #include <string.h>
 #include <unistd.h>
 
+#include <optional>
 #include <string>
 #include <string_view>
 #include <unordered_set>
 
+#include "common/streams.h"
 #include "recovery_utils/mounts_ex.h"
 #include "recovery_utils/mounts_ex_log.h"
-#include "recovery_utils/streams.h"
 
 using android::base::ParseInt;
 using android::base::Readlink;
@@ -20,11 +22,37 @@ using android::base::StartsWith;
 using android::base::StringPrintf;
 using sentrova::Directory;
 using sentrova::File;
-using sentrova::LineBuffer;
 using sentrova::mounts_ex::kLogTag;
 
 namespace android::recovery {
 namespace {
+
+// Memory for one line of a text stream, which grows with the longest line.
+class LineBuffer {
+ public:
+  LineBuffer() = default;
+  ~LineBuffer() { free(text_); }
+  LineBuffer(const LineBuffer&) = delete;
+  LineBuffer& operator=(const LineBuffer&) = delete;
+
+  // Returns the next line of `file` without its line end, valid until the next call, or nothing at
+  // the end or on an error.
+  std::optional<std::string_view> read(FILE* file) {
+    const ssize_t length = getline(&text_, &capacity_, file);
+    if (length < 0) {
+      return std::nullopt;
+    }
+    std::string_view line(text_, static_cast<size_t>(length));
+    if (line.ends_with('\n')) {
+      line.remove_suffix(1);
+    }
+    return line;
+  }
+
+ private:
+  char* text_ = nullptr;
+  size_t capacity_ = 0;
+};
 
 bool has_maps(const std::string& maps_path, const std::string& prefix) {
   char buffer[4096];  // the kernel gives a page at a time

@@ -2,20 +2,14 @@
 
 #include <dirent.h>
 
-#include <memory>
 #include <string_view>
 
+#include "common/streams.h"
+
 namespace sentrova::toolkit {
-namespace {
-
-struct DirectoryCloser {
-  void operator()(DIR* directory) const { closedir(directory); }
-};
-
-}  // namespace
 
 std::optional<std::vector<DirectoryEntry>> list_directory(const std::string& directory) {
-  const std::unique_ptr<DIR, DirectoryCloser> stream(opendir(directory.c_str()));
+  const Directory stream(opendir(directory.c_str()));
   if (stream == nullptr) {
     return std::nullopt;
   }

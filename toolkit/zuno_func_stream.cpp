@@ -10,6 +10,7 @@
 #include <string_view>
 #include <utility>
 
+#include "common/streams.h"
 #include "toolkit/shell.h"
 #include "toolkit/zuno_func.h"
 
@@ -19,10 +20,6 @@ namespace {
 
 struct FreeMemory {
   void operator()(void* memory) const { free(memory); }
-};
-
-struct CloseStream {
-  void operator()(FILE* stream) const { fclose(stream); }
 };
 
 // One stream from __popen. It stays in the list until its __pclose, also when its user closes the
@@ -100,7 +97,7 @@ FILE* __popen(const char* command, const char* mode) {
   const unique_fd& child_end = reads ? write_end : read_end;
 
   // The stream is opened before the command is started, so that there is nothing to take back.
-  std::unique_ptr<FILE, CloseStream> stream(android::base::Fdopen(std::move(own_end), mode));
+  sentrova::File stream(android::base::Fdopen(std::move(own_end), mode));
   if (stream == nullptr) {
     return nullptr;
   }

@@ -7,17 +7,13 @@
 
 #include <algorithm>
 #include <iterator>
-#include <memory>
 #include <string_view>
 #include <unordered_set>
 #include <utility>
 
-namespace {
+#include "common/streams.h"
 
-struct CloseDirectory {
-  void operator()(DIR* stream) const { closedir(stream); }
-};
-using DirectoryStream = std::unique_ptr<DIR, CloseDirectory>;
+namespace {
 
 // A path still to be searched. Links are resolved only when their turn comes.
 struct Pending {
@@ -46,7 +42,7 @@ bool resolve(std::string& path) {
 // empty string, with what the directory leads to put on the stack.
 std::string search_directory(const std::string& file_name, const std::string& directory,
                              std::vector<Pending>& pending) {
-  const DirectoryStream stream(opendir(directory.c_str()));
+  const sentrova::Directory stream(opendir(directory.c_str()));
   if (stream == nullptr) {
     // No blank before the path: log readers know the line in this form.
     PLOG(ERROR) << "Find_File: Error opening" << directory;
