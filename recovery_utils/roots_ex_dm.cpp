@@ -1,3 +1,6 @@
+#include "recovery_utils/roots_ex_dm.h"
+
+#include <android-base/properties.h>
 #include <errno.h>
 #include <libdm/dm.h>
 #include <stdio.h>
@@ -7,6 +10,8 @@
 #include "recovery_utils/roots_ex.h"
 #include "recovery_utils/roots_ex_log.h"
 
+using android::base::GetBoolProperty;
+using android::base::GetProperty;
 using sentrova::roots_ex::kLogTag;
 
 namespace {
@@ -15,6 +20,12 @@ constexpr int kRemoveTries = 5;
 constexpr useconds_t kRetryDelayMicroseconds = 100'000;
 
 }  // namespace
+
+bool sentrova::roots_ex::data_is_mapped() {
+  return GetProperty("ro.crypto.state", "") == "encrypted" &&
+         (GetProperty("ro.crypto.type", "") == "block" ||
+          GetBoolProperty("ro.crypto.metadata.enabled", false));
+}
 
 bool volume_revert_dm_device(const std::string& name) {
   if (name.empty()) {

@@ -1,4 +1,3 @@
-#include <android-base/properties.h>
 #include <errno.h>
 #include <libdm/dm.h>
 #include <stdio.h>
@@ -9,20 +8,16 @@
 #include <string_view>
 
 #include "common/log_at.h"
+#include "recovery_utils/roots_ex_dm.h"
 #include "recovery_utils/roots_ex_log.h"
 #include "recovery_utils/roots_ex_mount.h"
 
-using android::base::GetBoolProperty;
-using android::base::GetProperty;
 using android::dm::DeviceMapper;
 using android::dm::DmDeviceState;
 using android::fs_mgr::FstabEntry;
 
 namespace sentrova::roots_ex {
 namespace {
-
-constexpr char kMapping[] = "userdata";
-constexpr char kFirstMapping[] = "/dev/block/dm-0";
 
 constexpr int kMountAttempts = 2;
 constexpr int kLooks = 25;
@@ -32,23 +27,16 @@ void log_mapping(unsigned int line, android::base::LogSeverity severity, std::st
   log_at({"recovery_utils/roots_ex.cpp", line}, severity, text);
 }
 
-// File-based encryption alone works within the file system and maps nothing.
-bool data_is_mapped() {
-  return GetProperty("ro.crypto.state", "") == "encrypted" &&
-         (GetProperty("ro.crypto.type", "") == "block" ||
-          GetBoolProperty("ro.crypto.metadata.enabled", false));
-}
-
 // Returns the node of the data partition's device-mapper device, or where it is bound to appear.
 std::string find_mapping() {
   DeviceMapper& mapper = DeviceMapper::Instance();
   std::string node;
-  if (mapper.GetState(kMapping) == DmDeviceState::INVALID) {
-    log_mapping(
-        349, android::base::ERROR,
-        std::string("zuno_ensure_path_mounted: DeviceMapper state INVALID for ") + kMapping);
+  if (mapper.GetState(kUserdataMapping) == DmDeviceState::INVALID) {
+    log_mapping(349, android::base::ERROR,
+                std::string("zuno_ensure_path_mounted: DeviceMapper state INVALID for ") +
+                    kUserdataMapping);
   } else {
-    mapper.GetDmDevicePathByName(kMapping, &node);
+    mapper.GetDmDevicePathByName(kUserdataMapping, &node);
     log_mapping(347, android::base::INFO,
                 "zuno_ensure_path_mounted: userdata Dm device is " + node);
   }

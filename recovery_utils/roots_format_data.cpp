@@ -6,18 +6,17 @@
 
 #include "datadump/datadump.h"
 #include "recovery_utils/roots_ex.h"
+#include "recovery_utils/roots_ex_dm.h"
 #include "recovery_utils/roots_format_log.h"
 
 using android::base::GetBoolProperty;
-using android::base::GetProperty;
 using android::dm::DeviceMapper;
 using android::dm::DmDeviceState;
+using sentrova::roots_ex::kFirstMapping;
+using sentrova::roots_ex::kUserdataMapping;
 
 namespace sentrova {
 namespace {
-
-const std::string kUserdata = "userdata";
-constexpr char kFallbackDevice[] = "/dev/block/dm-0";
 
 bool is_dump_enabled() {
   const int status = datadump_get_status();
@@ -27,31 +26,26 @@ bool is_dump_enabled() {
   return enabled;
 }
 
-bool may_be_mapped(bool metadata_encryption) {
-  const bool encrypted = GetProperty("ro.crypto.state", "") == "encrypted";
-  const bool block = GetProperty("ro.crypto.type", "") == "block";
-  return encrypted && (block || metadata_encryption);
-}
-
 // Empty if there is no such device.
 std::string mapped_device() {
   DeviceMapper& mapper = DeviceMapper::Instance();
-  if (mapper.GetState(kUserdata) == DmDeviceState::INVALID) {
-    format_log::error(310, "format_volume: DeviceMapper state INVALID for " + kUserdata);
+  if (mapper.GetState(kUserdataMapping) == DmDeviceState::INVALID) {
+    format_log::error(
+        310, std::string("format_volume: DeviceMapper state INVALID for ") + kUserdataMapping);
     return "";
   }
   std::string path;
-  mapper.GetDmDevicePathByName(kUserdata, &path);
+  mapper.GetDmDevicePathByName(kUserdataMapping, &path);
   format_log::info(304, "format_volume: userdata Dm device is " + path);
   if (path.empty()) {
-    path = kFallbackDevice;
+    path = kFirstMapping;
     format_log::error(307, "format_volume: usedata Dm device miss, force set /dev/block/dm-0");
   }
   return path;
 }
 
 void revert_mapping(const std::string& path) {
-  const bool reverted = volume_revert_dm_device(kUserdata);
+  const bool reverted = volume_revert_dm_device(kUserdataMapping);
   format_log::info(328, "cryptfs revert userdata volume extend volume " + path +
                             (reverted ? " SUCCESS" : " FAIL"));
 }
@@ -75,9 +69,8 @@ void settle_mapping(FormatTarget& target, bool& revert_userdata) {
 
 FormatTarget choose_data_target(const android::fs_mgr::FstabEntry& row, bool& revert_userdata) {
   FormatTarget target{.device = row.blk_device, .dump_enabled = is_dump_enabled()};
-  const bool metadata = GetBoolProperty("ro.crypto.metadata.enabled", false);
-  if (may_be_mapped(metadata)) {
-    if (target.dump_enabled || metadata) {
+  if (roots_ex::data_is_mapped()) {
+    if (target.dump_enabled || GetBoolProperty("ro.crypto.metadata.enabled", false)) {
       revert_userdata = true;
       format_log::info(
           296,

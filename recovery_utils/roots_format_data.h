@@ -10,8 +10,8 @@ namespace sentrova {
 struct FormatTarget {
   std::string device;
   bool wipe_key = true;  // the row's key device goes too
-  bool dump_enabled =
-      false;  // a data dump is armed: the file system takes a fixed part of the device
+  // A data dump is armed: the file system takes a fixed part of the device.
+  bool dump_enabled = false;
 };
 
 // Decides which block device a format of the row for /data goes to. On an encrypted device that is
