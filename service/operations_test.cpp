@@ -154,7 +154,7 @@ TEST_F(Operations, TellAskAndPublishInOrder) {
 TEST_F(Operations, MapEveryLockStatus) {
   const std::pair<int, int32_t> rows[] = {{1, 11}, {2, 12}, {3, 13},  {4, 2},
                                           {5, 3},  {6, -1}, {-1, -1}, {INT_MIN, -1}};
-  credentials_.recording = false;
+  credentials_.on_call = [](const auto&) {};
   for (const auto& [lock_status, type] : rows) {
     credentials_.lock_status = lock_status;
     EXPECT_EQ(service_->getUserPassWordType(0), type) << "lock status " << lock_status;

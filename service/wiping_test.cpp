@@ -11,7 +11,6 @@
 namespace {
 
 TEST(UnlockWithAPassword, HandsOutItsOnlyCopyAndWipesIt) {
-  FakeCredentialLibrary::instance().recording = false;
   FakeCredentialLibrary::instance().matches = [](const std::string&) { return true; };
   std::optional<sentrova::FreedBlock> handed_out;
   FakeDecryptionLibrary::instance().user = [&](int, const std::string& secret, bool) {

@@ -28,27 +28,22 @@ FakeCredentialLibrary& FakeCredentialLibrary::instance() {
 
 ZunoGuardManager::ZunoGuardManager(int userId) {
   FakeCredentialLibrary& library = FakeCredentialLibrary::instance();
-  if (library.recording) {
-    library.storage_was_zero = look_at_storage(this, sizeof(*this));
-    current_manager = this;
-  }
-  library.record("manager ", std::to_string(userId));
+  library.storage_was_zero = look_at_storage(this, sizeof(*this));
+  current_manager = this;
+  library.on_call("manager " + std::to_string(userId));
 }
 
 int ZunoGuardManager::getLockStatus() {
-  FakeCredentialLibrary::instance().record("status");
+  FakeCredentialLibrary::instance().on_call("status");
   return FakeCredentialLibrary::instance().lock_status;
 }
 
 bool ZunoGuardManager::verifyPassword(std::string password) {
-  FakeCredentialLibrary::instance().record("verify ", password);
+  FakeCredentialLibrary::instance().on_call("verify " + password);
   return FakeCredentialLibrary::instance().matches(password);
 }
 
 LockSettingsStorage::~LockSettingsStorage() {
-  FakeCredentialLibrary& library = FakeCredentialLibrary::instance();
-  if (library.recording) {
-    library.record(static_cast<const void*>(this) == current_manager ? "storage gone 1"
-                                                                     : "storage gone 2");
-  }
+  const bool is_first = static_cast<const void*>(this) == current_manager;
+  FakeCredentialLibrary::instance().on_call(is_first ? "storage gone 1" : "storage gone 2");
 }

@@ -6,5 +6,3 @@
 // change.
 #define BINDER_LOGE(...) \
   static_cast<void>(__android_log_print(ANDROID_LOG_ERROR, "binder", __VA_ARGS__))
-#define BINDER_LOGW(...) \
-  static_cast<void>(__android_log_print(ANDROID_LOG_WARN, "binder", __VA_ARGS__))
