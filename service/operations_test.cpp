@@ -8,6 +8,7 @@
 #include <climits>
 #include <filesystem>
 #include <functional>
+#include <optional>
 #include <string>
 
 #include "recovery_utils/roots_ex.h"
@@ -15,6 +16,7 @@
 #include "service/sentrova_service.h"
 #include "tests/support/fake_credential_library.h"
 #include "tests/support/fake_decryption_library.h"
+#include "tests/support/freed_block.h"
 #include "tests/support/process_limits.h"
 #include "tests/support/sleep_script.h"
 
@@ -159,6 +161,18 @@ TEST_F(Operations, MapEveryLockStatus) {
     credentials_.lock_status = lock_status;
     EXPECT_EQ(service_->getUserPassWordType(0), type) << "lock status " << lock_status;
   }
+}
+
+TEST_F(Operations, HandOutTheirOnlyCopyOfAPasswordAndWipeIt) {
+  std::optional<sentrova::FreedBlock> handed_out;
+  credentials_.matches = [](const auto&) { return true; };
+  decryption_.user = [&](int, const std::string& secret, bool) {
+    handed_out.emplace(secret.data());
+    return true;
+  };
+  output_of([&] { service_->fbeDecryptUserCe(0, std::string(1000, 'x'), false); });
+  ASSERT_TRUE(handed_out);
+  EXPECT_EQ(handed_out->state(), sentrova::FreedBlock::kWiped);
 }
 
 // Waits until a child has ended and leaves it to be reaped.
