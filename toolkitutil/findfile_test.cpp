@@ -29,21 +29,12 @@ using ::testing::StartsWith;
 
 namespace {
 
-// What a test sees and changes of the finder's directory reads; null where the real ones suffice.
-thread_local std::vector<std::string>* opened_paths = nullptr;
-thread_local const std::function<void(dirent*)>* on_entry = nullptr;
+// May change an entry, or the tree, as the finder lists it; null where the real ones suffice.
+const std::function<void(dirent*)>* on_entry = nullptr;
 
 }  // namespace
 
-// These stand in front of the C library's functions for the whole test program.
-extern "C" DIR* opendir(const char* path) {
-  static const auto real = reinterpret_cast<DIR* (*)(const char*)>(dlsym(RTLD_NEXT, "opendir"));
-  if (opened_paths != nullptr) {
-    opened_paths->push_back(path);
-  }
-  return real(path);
-}
-
+// Stands in front of the C library's function for the whole test program.
 extern "C" dirent* readdir(DIR* stream) {
   static const auto real = reinterpret_cast<dirent* (*)(DIR*)>(dlsym(RTLD_NEXT, "readdir"));
   dirent* entry = real(stream);
@@ -80,24 +71,22 @@ class FindFile : public ::testing::Test {
     ASSERT_EQ(0, symlink(target.c_str(), at(path).c_str())) << strerror(errno);
   }
 
-  // Searches and notes the directories that were opened, in order, and what was logged;
-  // `entry_seen` may change an entry, or the tree, as it is listed.
+  // Searches and notes the directories that were entered, in order, and what was logged.
   std::string find(
       const std::string& name, const std::string& start,
       const std::function<void(dirent*)>& entry_seen = [](dirent*) {}) {
-    opened_.clear();
     log_.clear();
-    opened_paths = &opened_;
     on_entry = &entry_seen;
-    std::string match = Find_File::Find(name, start);
+    Find_File finder;
+    std::string match = finder.Find_Internal(name, start);
     on_entry = nullptr;
-    opened_paths = nullptr;
+    entered_ = finder.searched_dirs;
     return match;
   }
 
   TemporaryDir folder_;
   std::string root_;
-  std::vector<std::string> opened_;
+  std::vector<std::string> entered_;
   std::vector<std::string> log_;
 };
 
@@ -120,7 +109,7 @@ TEST_F(FindFile, MatchesOnlyARegularFileWithExactlyThatName) {
   }
   EXPECT_EQ("", find(std::string("Wanted\0", 7), root_));
   EXPECT_EQ("", find("Wanted", root_, [](dirent* entry) { entry->d_type = DT_UNKNOWN; }));
-  EXPECT_THAT(opened_, ElementsAre(root_));
+  EXPECT_THAT(entered_, ElementsAre(root_));
   EXPECT_THAT(log_, IsEmpty());
 }
 
@@ -146,8 +135,8 @@ TEST_F(FindFile, TakesFilesThenSubdirectoriesThenLinksInListedOrder) {
         }
       }));
   subdirectories.insert(subdirectories.end(), links.begin(), links.end());
-  EXPECT_EQ(subdirectories, opened_);
-  EXPECT_EQ(7u, opened_.size());
+  EXPECT_EQ(subdirectories, entered_);
+  EXPECT_EQ(7u, entered_.size());
   EXPECT_THAT(log_, IsEmpty());
 }
 
@@ -188,11 +177,11 @@ TEST_F(FindFile, EntersEachSpellingOfAPathOnce) {
   make_link("tree", "alias");
   const std::string tree = at("tree");
   EXPECT_EQ("", find("absent", tree));
-  EXPECT_THAT(opened_, ElementsAre(tree, tree + "/sub"));
+  EXPECT_THAT(entered_, ElementsAre(tree, tree + "/sub"));
   // The links resolve to a path that was not entered yet, so the tree is searched once more.
   for (const std::string& start : {at("alias"), tree + "/"}) {
     EXPECT_EQ("", find("absent", start));
-    EXPECT_THAT(opened_, ElementsAre(start, start + "/sub", tree, tree + "/sub"));
+    EXPECT_THAT(entered_, ElementsAre(start, start + "/sub", tree, tree + "/sub"));
   }
   EXPECT_THAT(log_, IsEmpty());
 }
@@ -204,6 +193,7 @@ TEST_F(FindFile, AFinderRemembersWhatItEntered) {
   EXPECT_EQ(at("sub/first"), finder.Find_Internal("first", root_));
   EXPECT_EQ("", finder.Find_Internal("second", root_));
   EXPECT_EQ("", finder.Find_Internal("first", at("sub")));
+  EXPECT_EQ(at("sub/first"), Find_File::Find("first", at("sub")));
   EXPECT_EQ(root_ + "//second", finder.Find_Internal("second", root_ + "/"));
   EXPECT_THAT(finder.searched_dirs, ElementsAre(root_, at("sub"), root_ + "/"));
 }
@@ -222,7 +212,7 @@ TEST_F(FindFile, DepthCostsNoDescriptorsUpToThePathThatIsTooLongToOpen) {
     const DescriptorLimit one_more_descriptor(1);
     EXPECT_EQ(at("aside/wanted"), find("wanted", at("tree")));
   }
-  EXPECT_GT(opened_.size(), 100u);
+  EXPECT_GT(entered_.size(), 100u);
   EXPECT_THAT(log_, ElementsAre(AllOf(StartsWith("Find_File: Error opening" + at("tree/ddd")),
                                       EndsWith(": File name too long"))));
   EXPECT_EQ("", find("target", at("tree")));
