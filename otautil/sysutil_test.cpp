@@ -10,16 +10,18 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <filesystem>
 #include <string>
 #include <tuple>
 #include <utility>
 #include <vector>
 
+#include "tests/support/descriptors.h"
+
 namespace {
 
 using android::base::SetProperty;
 using android::base::WriteStringToFile;
+using sentrova::testing::count_descriptors;
 using ::testing::EndsWith;
 using ::testing::StartsWith;
 
@@ -27,11 +29,6 @@ using Cases = std::vector<std::pair<std::string, std::string>>;
 
 constexpr size_t kBlock = 4096;
 constexpr size_t kDeviceBlocks = 16;
-
-long open_descriptors() {
-  const std::filesystem::directory_iterator entries("/proc/self/fd");
-  return std::distance(begin(entries), end(entries));
-}
 
 // A file in the place of a block device, each block of which is filled with a letter of its own
 // and ends within a page, and a block map for it.
@@ -131,7 +128,7 @@ TEST_F(BlockMaps, WithADefectAreRefusedByName) {
 }
 
 TEST_F(BlockMaps, ThatTheDeviceCannotServeLeaveNothingBehind) {
-  const long descriptors = open_descriptors();
+  const auto descriptors = count_descriptors();
   const Cases cases = {
       // Past the device's end; a block of it alone would be mapped and raise SIGBUS when read.
       {"8192 4096\n2\n0 1\n16 17", "failed to map range 16: 17: No such device or address"},
@@ -155,7 +152,7 @@ TEST_F(BlockMaps, ThatTheDeviceCannotServeLeaveNothingBehind) {
   for (const std::string no_device : {"/dev/zero", "/proc"}) {
     EXPECT_FALSE(map_text(no_device + "\n4096 4096\n1\n0 1")) << no_device;
   }
-  EXPECT_EQ(open_descriptors(), descriptors);
+  EXPECT_EQ(count_descriptors(), descriptors);
 }
 
 TEST_F(BlockMaps, PlainFilesAreMappedWholeOrNamed) {

@@ -5,9 +5,10 @@
 #include <sys/stat.h>
 
 #include <filesystem>
-#include <iterator>
 #include <set>
 #include <string>
+
+#include "tests/support/descriptors.h"
 
 namespace sentrova::toolkit {
 
@@ -15,7 +16,7 @@ namespace sentrova::toolkit {
 class ScratchTest : public ::testing::Test {
  protected:
   ~ScratchTest() override {
-    EXPECT_EQ(count_descriptors(), descriptors_before_);
+    EXPECT_EQ(testing::count_descriptors(), descriptors_before_);
     std::error_code error;
     std::filesystem::remove_all(root(), error);
   }
@@ -59,12 +60,7 @@ class ScratchTest : public ::testing::Test {
   }
 
  private:
-  static std::ptrdiff_t count_descriptors() {
-    const std::filesystem::directory_iterator descriptors("/proc/self/fd");
-    return std::distance(begin(descriptors), end(descriptors));
-  }
-
-  const std::ptrdiff_t descriptors_before_ = count_descriptors();
+  const std::ptrdiff_t descriptors_before_ = testing::count_descriptors();
   TemporaryDir directory_;
 };
 

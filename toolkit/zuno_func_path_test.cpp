@@ -7,7 +7,7 @@
 #include <unistd.h>
 
 #include "tests/support/captured_stdout.h"
-#include "tests/support/descriptor_limit.h"
+#include "tests/support/descriptors.h"
 #include "tests/support/private_mounts.h"
 #include "toolkit/scratch_test.h"
 #include "toolkit/zuno_func.h"

@@ -4,19 +4,19 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <filesystem>
-#include <iterator>
 #include <memory>
 #include <string>
 #include <thread>
 #include <vector>
 
+#include "tests/support/descriptors.h"
 #include "tests/support/private_mounts.h"
 #include "tests/support/process_limits.h"
 #include "toolkit/zuno_func.h"
 
 namespace {
 
+using sentrova::testing::count_descriptors;
 using ::testing::ExitedWithCode;
 
 // Lists the command's descriptors.
@@ -26,11 +26,6 @@ std::string read_all(FILE* stream) {
   std::string text;
   EXPECT_TRUE(stream != nullptr && android::base::ReadFdToString(fileno(stream), &text));
   return text;
-}
-
-size_t count_descriptors() {
-  const std::filesystem::directory_iterator entries("/proc/self/fd");
-  return static_cast<size_t>(std::distance(begin(entries), end(entries)));
 }
 
 class PipeStreams : public ::testing::Test {
@@ -77,7 +72,7 @@ TEST_F(PipeStreams, OpenedByTwoThreadsAtOnceReachNoOtherChild) {
   FILE* alone = __popen(kListDescriptors, "r");
   const std::string usual = read_all(alone);
   __pclose(alone);
-  const size_t descriptors = count_descriptors();
+  const auto descriptors = count_descriptors();
   const auto use = [&] {
     for (int round = 0; round < 150; ++round) {
       FILE* input = __popen("exit 5", "w");
@@ -109,7 +104,7 @@ TEST_F(PipeStreams, WorkInAProcessWithoutStandardStreams) {
 
 TEST_F(PipeStreams, LeaveNothingBehindWhenTheyCannotBeOpened) {
   const auto fails_with = [](int error) {
-    const size_t descriptors = count_descriptors();
+    const auto descriptors = count_descriptors();
     errno = 0;
     const bool failed = __popen("true", "r") == nullptr;
     return failed && errno == error && count_descriptors() == descriptors ? 0 : 1;

@@ -17,7 +17,7 @@
 #include <string_view>
 #include <vector>
 
-#include "tests/support/descriptor_limit.h"
+#include "tests/support/descriptors.h"
 
 using sentrova::testing::DescriptorLimit;
 using ::testing::AllOf;

@@ -4,7 +4,16 @@
 #include <fcntl.h>
 #include <sys/resource.h>
 
+#include <filesystem>
+#include <iterator>
+
 namespace sentrova::testing {
+
+// Returns how many descriptors this process has open; one more, each time, for the look itself.
+inline std::ptrdiff_t count_descriptors() {
+  const std::filesystem::directory_iterator descriptors("/proc/self/fd");
+  return std::distance(begin(descriptors), end(descriptors));
+}
 
 // Lowers this process's limit on open descriptors to those open now and `spare` more, until
 // destruction. Exact where the open descriptors have no gaps: the limit is on their numbers.
