@@ -14,49 +14,14 @@
 namespace android {
 namespace {
 
-const String16 kName("sentrova.test.IAdder");
-
-class Adder : public BBinder {
+class Dumper : public BBinder {
  public:
-  const String16& getInterfaceDescriptor() const override { return kName; }
   status_t dump(int fd, const Vector<String16>& args) override {
     for (const String16& arg : args)
       dprintf(fd, "%s;", String8(arg).string());
     return OK;
   }
-
-  uint32_t last_flags = 0;
-  bool reply_was_sensitive = false;
-
- protected:
-  status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
-    if (code != FIRST_CALL_TRANSACTION)
-      return BBinder::onTransact(code, data, reply, flags);
-    last_flags = flags;
-    reply_was_sensitive = reply->isSensitive();
-    if (!data.checkInterface(this))
-      return PERMISSION_DENIED;
-    const int32_t a = data.readInt32();
-    return reply->writeInt32(a + data.readInt32());
-  }
 };
-
-TEST(LocalObject, RewindsBothParcels) {
-  const sp<Adder> object = new Adder();
-  Parcel data;
-  data.writeInterfaceToken(kName);
-  data.writeInt32(1);
-  data.writeInt32(2);
-  Parcel reply;
-  ASSERT_EQ(
-      OK, object->transact(IBinder::FIRST_CALL_TRANSACTION, data, &reply, IBinder::FLAG_CLEAR_BUF));
-  EXPECT_EQ(0U, reply.dataPosition());
-  EXPECT_EQ(4U, reply.dataSize());
-  EXPECT_EQ(3, reply.readInt32());
-  EXPECT_EQ(uint32_t{IBinder::FLAG_CLEAR_BUF}, object->last_flags);
-  EXPECT_TRUE(object->reply_was_sensitive);
-  EXPECT_EQ(OK, object->transact(IBinder::FIRST_CALL_TRANSACTION, data, nullptr));
-}
 
 TEST(LocalObject, DumpsToADescriptorAndCleansItsAttachmentsOnce) {
   int cleaned = 0;
@@ -64,7 +29,7 @@ TEST(LocalObject, DumpsToADescriptorAndCleansItsAttachmentsOnce) {
   int second = 0;
   const TemporaryFile file;
   {
-    const sp<IBinder> object = new Adder();
+    const sp<IBinder> object = new Dumper();
     Parcel data;
     data.writeFileDescriptor(file.fd);
     data.writeInt32(2);

@@ -5,7 +5,6 @@ namespace {
 
 using android::fs_mgr::Fstab;
 using android::fs_mgr::FstabEntry;
-using android::fs_mgr::GetEntryForMountPoint;
 using android::fs_mgr::GetEntryForPath;
 
 Fstab make_table(const std::vector<std::string>& mount_points) {
@@ -18,7 +17,7 @@ Fstab make_table(const std::vector<std::string>& mount_points) {
   return table;
 }
 
-TEST(FstabLookup, FindsTheNearestAncestorThatIsAMountPoint) {
+TEST(FstabLookup, FindsTheFirstRowOfTheNearestAncestorThatIsAMountPoint) {
   Fstab table = make_table({"/data", "/data/media", "/", "none", "/data", "/cache/"});
   const std::pair<const char*, const FstabEntry*> kCases[] = {{"/data", &table[0]},
                                                               {"/data/", &table[0]},
@@ -39,13 +38,6 @@ TEST(FstabLookup, FindsTheNearestAncestorThatIsAMountPoint) {
   for (const char* path : {"/", "/cache/x", ""}) {
     EXPECT_EQ(GetEntryForPath(&table, path), nullptr) << path;
   }
-}
-
-TEST(FstabLookup, AMountPointIsMatchedWholeAndTheFirstRowWins) {
-  Fstab table = make_table({"/data", "/cache", "/data"});
-  EXPECT_EQ(GetEntryForMountPoint(&table, "/data"), &table[0]);
-  EXPECT_EQ(GetEntryForMountPoint(&table, "/data/"), nullptr);
-  EXPECT_EQ(GetEntryForMountPoint(&table, "/dat"), nullptr);
 }
 
 }  // namespace
