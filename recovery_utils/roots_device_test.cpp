@@ -276,16 +276,6 @@ TEST_F(FormattedVolumes, OfEveryKindAreFilledOrEmpty) {
   }
 }
 
-TEST_F(FormattedVolumes, AreNotOfALengthThatTheDeviceHasNot) {
-  const std::string mark(16384, 'x');
-  for (const int64_t length : {int64_t{1} << 30, -kSize, -kSize - 1}) {
-    ASSERT_TRUE(write_device(disk_.path(), 0, mark));
-    load(disk_.path() + " /cache ext4 noatime length=" + std::to_string(length) + "\n");
-    EXPECT_EQ(format_volume("/cache"), -1);
-    EXPECT_TRUE(length > 0 || read_device(disk_.path(), 0, mark.size()) == mark);
-  }
-}
-
 TEST_F(FormattedVolumes, LoseTheirKeyUnlessTheMappedDataAreFormattedInPlace) {
   const std::string mark(4096, 'k');
   const LoopDevice key(1 << 20);

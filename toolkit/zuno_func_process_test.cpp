@@ -175,10 +175,7 @@ TEST_F(Commands, AreLookedAfterEverySecondUntilTheTimeOut) {
   }
 }
 
-TEST_F(Commands, AreKilledAfterTheTimeOutWhateverTheyIgnore) {
-  // Programs keep the signals ignored that their parent ignored.
-  const ScopedSignalAction no_term(SIGTERM, SIG_IGN);
-  const ScopedSignalAction no_interrupt(SIGINT, SIG_IGN);
+TEST_F(Commands, AreKilledAfterTheTimeOut) {
   for (const size_t timeout_seconds : {size_t{0}, size_t{2}}) {
     const pid_t pid = start("exec sleep 10");
     const auto last_two_seconds = [&](size_t second) {
