@@ -114,25 +114,23 @@ std::optional<RangeSet> RangeSet::GetSubRanges(size_t start_index, size_t num_of
     LOG(WARNING) << "num_of_blocks is zero when calling GetSubRanges()";
     return RangeSet();
   }
-  const size_t end_index = start_index + num_of_blocks;
   RangeSet result;
-  size_t before = 0;
+  size_t to_skip = start_index;
+  size_t to_take = num_of_blocks;
   for (const auto& [range_start, range_end] : ranges_) {
     CHECK_LT(range_start, range_end)
         << "range_start: " << range_start << " range_end: " << range_end;
-    const size_t after = before + (range_end - range_start);
-    if (after > start_index) {
-      const size_t piece_start = range_start + (start_index > before ? start_index - before : 0);
-      const bool is_last = end_index <= after;
-      const size_t piece_end = is_last ? range_end - (after - end_index) : range_end;
-      if (!result.PushBack({piece_start, piece_end})) {
-        return std::nullopt;
-      }
-      if (is_last) {
-        return result;
-      }
+    const size_t skipped = std::min(to_skip, range_end - range_start);
+    const size_t first = range_start + skipped;
+    const size_t taken = std::min(to_take, range_end - first);
+    if (taken > 0 && !result.PushBack({first, first + taken})) {
+      return std::nullopt;
     }
-    before = after;
+    to_skip -= skipped;
+    to_take -= taken;
+    if (to_take == 0) {
+      return result;
+    }
   }
   LOG(ERROR) << "Failed to construct byte ranges to read, start_block: " << start_index
              << ", num_of_blocks: " << num_of_blocks << " total number of blocks: " << blocks_;
