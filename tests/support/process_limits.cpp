@@ -1,8 +1,6 @@
 #include "tests/support/process_limits.h"
 
-#include <android-base/unique_fd.h>
 #include <errno.h>
-#include <fcntl.h>
 #include <sys/resource.h>
 #include <sys/types.h>
 #include <unistd.h>
@@ -21,13 +19,6 @@ bool forbid_new_processes() {
     _exit(0);
   }
   return pid == -1 && errno == EAGAIN;
-}
-
-bool forbid_new_descriptors() {
-  const android::base::unique_fd lowest(open("/dev/null", O_RDONLY | O_CLOEXEC));
-  const rlim_t one_more = static_cast<rlim_t>(lowest.get()) + 1;
-  const rlimit limit = {.rlim_cur = one_more, .rlim_max = one_more};
-  return lowest != -1 && setrlimit(RLIMIT_NOFILE, &limit) == 0;
 }
 
 }  // namespace sentrova::testing
