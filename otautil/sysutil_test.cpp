@@ -83,7 +83,7 @@ TEST_F(BlockMaps, AreMappedInTheirOrder) {
       {"12188 4096\n2\n10 12\n3 4", (blocks(10, 12) + blocks(3, 4)).substr(0, 12188)},
       {"4097 4096\n1\n7 9\n\n \t\n", blocks(7, 9).substr(0, 4097)},
       {" 8192\t4096 rest\n+2 of them\n3 4 x\n3 4 x", blocks(3, 4) + blocks(3, 4)},
-      {"8182 8192\n1\n7 8", content_.substr(14 * kBlock)},
+      {"8192 8192\n1\n7 8", content_.substr(14 * kBlock) + std::string(10, '\0')},
       {"4086 12288\n1\n5 6", content_.substr(15 * kBlock)},  // the device ends pages before it
       {"1024 1024\n1\n8 9", blocks(2, 3).substr(0, 1024)},
   };
@@ -161,10 +161,11 @@ TEST_F(BlockMaps, PlainFilesAreMappedWholeOrNamed) {
   EXPECT_EQ(mapping_.mapped_ranges.at(0).length, content_.size());
   ASSERT_TRUE(mapping_.MapFD(device_.fd));
   EXPECT_EQ(device_mappings(), 1u);
-  MemMapping moved = std::move(mapping_);
-  EXPECT_EQ(mapping_.addr, nullptr);  // NOLINT(bugprone-use-after-move): is emptied by it
-  EXPECT_EQ(moved.length, content_.size());
-  moved = MemMapping();
+  {
+    const MemMapping moved = std::move(mapping_);
+    EXPECT_EQ(mapping_.addr, nullptr);  // NOLINT(bugprone-use-after-move): is emptied by it
+    EXPECT_EQ(moved.length, content_.size());
+  }
   EXPECT_EQ(device_mappings(), 0u);
 
   const TemporaryFile empty;
