@@ -156,7 +156,7 @@ TEST_F(VolumeTable, GetsTheSystemsRowByTheRootCheck) {
   // "MOUNT_POINT TYPE DEVICE" each, and the row that is appended, if any. The slot is _a.
   const std::pair<Texts, std::string> cases[] = {
       {{"/system ext4 /dev/system_a"}, "/mnt/system ext4 /dev/system_a"},
-      {{"/system ext4 system_a"}, "/mnt/system ext4 system_a"},
+      {{"/system ext4 system_a", "system_a ext4 /dev/system_a"}, "/mnt/system ext4 system_a"},
       {{"/system ext4 /dev/mysystem_a"}, ""},
       {{"/system ext4 /dev/system_b"}, ""},
       {{"/vendor ext4 /dev/system_a"}, ""},
