@@ -107,6 +107,7 @@ TEST_F(Commands, HaveTheirOutputAppendedPieceByPiece) {
       {"echo before; kill -15 $$", "before\n", 15},
       {"echo " + long_line, long_line + "\n", 0},
       {R"(printf 'a\0b\nc\n\0\nd')", "ac\nd", 0},  // what follows a NUL in a line is dropped
+      {R"(printf '%0127d\0b' 0)", std::string(127, '0'), 0},  // a piece is full before the NUL
       {"exec >&-; sleep 0.1; exit 4", "", 4 << 8},
       {"printf abc; sleep 0.2; echo def; exec >&-; sleep 0.1; exit 2", "abcdef\n", 2 << 8},
   };
