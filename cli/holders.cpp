@@ -3,15 +3,15 @@
 #include <android-base/file.h>
 #include <android-base/parseint.h>
 #include <android-base/strings.h>
-#include <dirent.h>
 #include <stdio.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
 #include <functional>
-#include <memory>
 #include <set>
+
+#include "common/streams.h"
 
 namespace sentrova {
 namespace {
@@ -21,7 +21,7 @@ constexpr char kProc[] = "/proc/";
 // Calls `visit` with the number of each entry that is a number. Returns false, with `errno`, if the
 // directory cannot be opened.
 bool for_each_number(const std::string& path, const std::function<void(int)>& visit) {
-  const std::unique_ptr<DIR, int (*)(DIR*)> directory(opendir(path.c_str()), closedir);
+  const Directory directory(opendir(path.c_str()));
   if (directory == nullptr) {
     return false;
   }

@@ -5,9 +5,10 @@
 #include <stdio.h>
 #include <unistd.h>
 
-#include <cerrno>
 #include <limits>
+#include <optional>
 
+#include "common/read_at_most.h"
 #include "otautil/sysutil.h"
 
 namespace {
@@ -19,26 +20,11 @@ constexpr size_t kHeaderLines = 3;
 // What is longer, or never ends, as a device can, must not take the memory.
 constexpr size_t kMaxMapBytes = 64 << 20;
 
-// Reads a whole file of any kind. Returns false with `errno` otherwise, EFBIG for one that is
-// longer than the limit.
-bool read_map(const std::string& path, std::string& content) {
-  android::base::unique_fd file;
-  do {
-    file.reset(open(path.c_str(), O_RDONLY | O_CLOEXEC));
-  } while (file == -1 && errno == EINTR);
-  if (file == -1) {
-    return false;
-  }
-  char buffer[16384];
-  while (content.size() <= kMaxMapBytes) {
-    const ssize_t count = TEMP_FAILURE_RETRY(read(file.get(), buffer, sizeof(buffer)));
-    if (count <= 0) {
-      return count == 0;
-    }
-    content.append(buffer, static_cast<size_t>(count));
-  }
-  errno = EFBIG;
-  return false;
+// Reads a whole file of any kind. Nothing, with `errno`, otherwise.
+std::optional<std::string> read_map(const std::string& path) {
+  const android::base::unique_fd file(
+      static_cast<int>(TEMP_FAILURE_RETRY(open(path.c_str(), O_RDONLY | O_CLOEXEC))));
+  return file.ok() ? sentrova::read_at_most(file.get(), kMaxMapBytes) : std::nullopt;
 }
 
 // Returns false, with an error logged, if the line does not hold two positive sizes.
@@ -104,12 +90,12 @@ bool parse_ranges(const std::vector<std::string>& lines, BlockMapData& map) {
 }  // namespace
 
 BlockMapData BlockMapData::ParseBlockMapFile(const std::string& path) {
-  std::string content;
-  if (!read_map(path, content)) {
+  const std::optional<std::string> content = read_map(path);
+  if (!content) {
     PLOG(ERROR) << "Failed to read " << path;
     return {};
   }
-  const std::vector<std::string> lines = android::base::Split(android::base::Trim(content), "\n");
+  const std::vector<std::string> lines = android::base::Split(android::base::Trim(*content), "\n");
   if (lines.size() <= kHeaderLines) {
     LOG(ERROR) << "Block map file is too short: " << lines.size();
     return {};

@@ -10,6 +10,8 @@
 
 #include <cerrno>
 
+#include "common/read_at_most.h"
+
 namespace sentrova::device {
 
 using android::base::unique_fd;
@@ -50,22 +52,7 @@ std::optional<std::string> read_property_text(const std::string& path) {
   if (!file.ok() || !is_regular(file.get())) {
     return std::nullopt;
   }
-  std::string text(kMaxPropertyFileBytes + 1, '\0');
-  size_t length = 0;
-  while (length < text.size()) {
-    const ssize_t count =
-        TEMP_FAILURE_RETRY(read(file.get(), text.data() + length, text.size() - length));
-    if (count < 0) {
-      return std::nullopt;
-    }
-    if (count == 0) {
-      text.resize(length);
-      return text;
-    }
-    length += static_cast<size_t>(count);
-  }
-  errno = EFBIG;
-  return std::nullopt;
+  return read_at_most(file.get(), kMaxPropertyFileBytes);
 }
 
 std::vector<Property> parse_property_text(std::string_view text, const std::string& path) {

@@ -11,6 +11,7 @@
 #include <cerrno>
 #include <optional>
 
+#include "common/read_at_most.h"
 #include "platform/linux/fs_mgr/fstab_options.h"
 #include "platform/linux/fs_mgr/mount_options.h"
 #include "platform/linux/fs_mgr/slots.h"
@@ -36,25 +37,7 @@ std::optional<std::string> read_regular_file(const std::string& path) {
     errno = EINVAL;
     return std::nullopt;
   }
-  std::string text(kMaxFstabBytes + 1, '\0');
-  size_t length = 0;
-  while (length < text.size()) {
-    const ssize_t count =
-        TEMP_FAILURE_RETRY(read(file.get(), text.data() + length, text.size() - length));
-    if (count < 0) {
-      return std::nullopt;
-    }
-    if (count == 0) {
-      break;
-    }
-    length += static_cast<size_t>(count);
-  }
-  if (length > kMaxFstabBytes) {
-    errno = EFBIG;
-    return std::nullopt;
-  }
-  text.resize(length);
-  return text;
+  return sentrova::read_at_most(file.get(), kMaxFstabBytes);
 }
 
 std::vector<std::string> split_fields(const std::string& line) {
