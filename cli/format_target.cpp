@@ -116,7 +116,7 @@ std::string describe_format(const FstabEntry& row, const std::string& directory)
   if (row.key_loc.starts_with('/')) {
     text += "\n  key device   " + row.key_loc + " may be wiped";
   }
-  if (const size_t holders = find_holders(row.mount_point).holders.size(); holders > 0) {
+  if (const size_t holders = count_ended_by_force(row.mount_point); holders > 0) {
     text += "\n  in use by    " + std::to_string(holders) +
             " processes, which will be ended where they stay";
   }

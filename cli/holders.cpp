@@ -34,38 +34,41 @@ bool for_each_number(const std::string& path, const std::function<void(int)>& vi
   return true;
 }
 
-void add_link(const std::string& link, HeldPath held, const std::string& path, Holder& holder) {
-  if (android::base::Readlink(link, &held.path) && lies_in(held.path, path)) {
+// Whether a path that a process holds is one of those that are looked for.
+using IsWanted = std::function<bool(const std::string& held)>;
+
+void add_link(const std::string& link, HeldPath held, const IsWanted& is_wanted, Holder& holder) {
+  if (android::base::Readlink(link, &held.path) && is_wanted(held.path)) {
     holder.held.push_back(std::move(held));
   }
 }
 
 // A file's mappings count once.
-void add_mappings(const std::string& maps_path, const std::string& path, Holder& holder) {
+void add_mappings(const std::string& maps_path, const IsWanted& is_wanted, Holder& holder) {
   std::string maps;
   android::base::ReadFileToString(maps_path, &maps);
   std::set<std::string> files;
   for (const std::string& line : android::base::Split(maps, "\n")) {
     const std::string file = mapped_path(line);
-    if (lies_in(file, path) && files.insert(file).second) {
+    if (is_wanted(file) && files.insert(file).second) {
       holder.held.push_back({.by = "mapping", .path = file});
     }
   }
 }
 
 // Returns false where the process may not be looked into.
-bool read_holder(const std::string& path, Holder& holder) {
+bool read_holder(const IsWanted& is_wanted, Holder& holder) {
   const std::string base = kProc + std::to_string(holder.pid);
   for (const char* const by : {"cwd", "root", "exe"}) {
-    add_link(base + "/" + by, {.by = by, .path = ""}, path, holder);
+    add_link(base + "/" + by, {.by = by, .path = ""}, is_wanted, holder);
   }
   const std::string descriptors = base + "/fd";
   const bool is_open = for_each_number(descriptors, [&](int descriptor) {
     add_link(descriptors + "/" + std::to_string(descriptor),
-             {.by = "descriptor", .descriptor = descriptor, .path = ""}, path, holder);
+             {.by = "descriptor", .descriptor = descriptor, .path = ""}, is_wanted, holder);
   });
   const bool may_look = is_open || errno != EACCES;
-  add_mappings(base + "/maps", path, holder);
+  add_mappings(base + "/maps", is_wanted, holder);
   return may_look;
 }
 
@@ -82,9 +85,7 @@ std::string read_name(pid_t pid) {
   return "[" + android::base::Trim(text) + "]";
 }
 
-}  // namespace
-
-HolderSearch find_holders(const std::string& path) {
+HolderSearch search_processes(const IsWanted& is_wanted) {
   HolderSearch search;
   for_each_number(kProc, [&](int pid) {
     if (pid == getpid()) {
@@ -92,7 +93,7 @@ HolderSearch find_holders(const std::string& path) {
     }
     Holder holder;
     holder.pid = pid;
-    if (!read_holder(path, holder)) {
+    if (!read_holder(is_wanted, holder)) {
       ++search.unreadable;
     }
     if (!holder.held.empty()) {
@@ -105,10 +106,23 @@ HolderSearch find_holders(const std::string& path) {
   return search;
 }
 
+}  // namespace
+
+HolderSearch find_holders(const std::string& path) {
+  return search_processes([&path](const std::string& held) { return lies_in(held, path); });
+}
+
+size_t count_ended_by_force(const std::string& mount_point) {
+  const auto is_wanted = [&mount_point](const std::string& held) {
+    return held.starts_with(mount_point);
+  };
+  return search_processes(is_wanted).holders.size();
+}
+
 std::string find_own_hold(const std::string& path) {
   Holder self;
   self.pid = getpid();
-  read_holder(path, self);
+  read_holder([&path](const std::string& held) { return lies_in(held, path); }, self);
   return self.held.empty()
              ? ""
              : path + " is held by this command, which was started there or is redirected there";

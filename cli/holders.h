@@ -29,6 +29,10 @@ struct HolderSearch {
 // or something below it. Nothing is signalled. What ends meanwhile is passed over.
 HolderSearch find_holders(const std::string& path);
 
+// How many processes a forced unmount would end if none let go: it compares names as plain text, so
+// that /data stands for /data2 too.
+size_t count_ended_by_force(const std::string& mount_point);
+
 // Why the path stays busy as long as the calling process runs, in words; empty where it does not.
 std::string find_own_hold(const std::string& path);
 

@@ -67,6 +67,9 @@ TEST(Holders, AreFoundByAllTheyHoldAndLive) {
   EXPECT_EQ(held, "cwd ;descriptor n /a\nb;mapping /a\\012b;");
   EXPECT_EQ(process.ended_by(), 0);
   EXPECT_TRUE(sentrova::find_holders(path + "2").holders.empty());
+  const std::string beginning = path.substr(0, path.size() - 1);
+  EXPECT_TRUE(sentrova::find_holders(beginning).holders.empty());
+  EXPECT_EQ(sentrova::count_ended_by_force(beginning), 1u) << "force goes by the text";
   EXPECT_EQ(sentrova::find_own_hold(path), "");
   const android::base::unique_fd own(open(file.c_str(), O_RDONLY | O_CLOEXEC));
   EXPECT_NE(sentrova::find_own_hold(path), "");
